@@ -1,0 +1,30 @@
+#include "module/protocol_factory.h"
+
+#include <cstring>
+
+namespace xtok {
+
+void* ProtocolFactory::Destroy(unsigned) {
+    // The factory is a static part of the root object: nothing to free.
+    return this;
+}
+
+void* ProtocolFactory::GetInterface(const char* name) {
+    if (name && (std::strcmp(name, "ProtocolFactory") == 0 ||
+                 std::strcmp(name, "IProtocolFactory") == 0)) {
+        return this;
+    }
+    return nullptr;
+}
+
+IProtocol7* ProtocolFactory::CreateProtocol(const char*) {
+    return nullptr;
+}
+
+void ProtocolFactory::DestroyProtocol(IProtocol7* protocol) {
+    if (protocol) {
+        protocol->Destroy(1);
+    }
+}
+
+}  // namespace xtok

@@ -1,0 +1,61 @@
+#include "tests/support/fake_host.h"
+
+namespace xtok::test {
+
+const char* const kServiceNames[9] = {"IMultiTask2", "ISerialFactory", "ISocketFactory",
+                                      "ICDSBuffer",  "IDiag",          "IPermanentStorage",
+                                      "IDriverInterface", "ISmux",     "IFastTimer"};
+
+FakeHost::FakeHost() {
+    // Until a test provides a working service, each name is backed by an
+    // object that answers only the four common slots.
+    for (const char* name : kServiceNames) {
+        owned_.push_back(std::make_unique<FakeService<IHostService>>(name, 100));
+        services_[name] = owned_.back().get();
+    }
+}
+
+FakeHost::~FakeHost() = default;
+
+void* FakeHost::GetService(const char* name) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    std::string key = name ? name : "";
+    calls_.push_back("get " + key);
+    if (refused_.count(key) || !services_.count(key)) {
+        return nullptr;
+    }
+    ++outstanding_;
+    return services_[key];
+}
+
+void FakeHost::ReleaseService(void* service) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    calls_.push_back("release " + nameOf(service));
+    --outstanding_;
+}
+
+std::string FakeHost::nameOf(void* service) const {
+    for (const auto& [name, object] : services_) {
+        if (object == service) {
+            return name;
+        }
+    }
+    return service ? "?" : "null";
+}
+
+std::vector<std::string> FakeHost::calls() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return calls_;
+}
+
+void FakeHost::clearCalls() {
+    std::lock_guard<std::mutex> lock(mutex_);
+    calls_.clear();
+}
+
+int FakeHost::outstanding() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return outstanding_;
+}
+
+}  // namespace xtok::test

@@ -1,0 +1,37 @@
+// The built plug-in as a foreign runtime sees it: loaded with dlopen, reached
+// through GetInterfaceFactory and slot numbers only.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace xtok::test {
+
+/// dlopen of a plug-in file for the lifetime of the object.
+class PluginLibrary {
+public:
+    explicit PluginLibrary(const char* path = XTOK_PLUGIN_PATH);
+    ~PluginLibrary();
+    PluginLibrary(const PluginLibrary&) = delete;
+    PluginLibrary& operator=(const PluginLibrary&) = delete;
+
+    bool loaded() const { return handle_ != nullptr; }
+    const std::string& error() const { return error_; }
+    /// The root object from GetInterfaceFactory, or null.
+    void* root() const;
+    /// Slot 0 of the root: an interface by name.
+    void* rootInterface(const char* name) const;
+
+private:
+    void* handle_ = nullptr;
+    std::string error_;
+};
+
+/// Names of the symbols an ELF shared object defines in its dynamic symbol
+/// table (what other objects can link against).
+std::vector<std::string> definedDynamicSymbols(const std::string& path);
+
+/// The whole file as bytes; empty when it cannot be read.
+std::string readWholeFile(const std::string& path);
+
+}  // namespace xtok::test
