@@ -7,12 +7,14 @@ const char* const kServiceNames[9] = {"IMultiTask2", "ISerialFactory", "ISocketF
                                       "IDriverInterface", "ISmux",     "IFastTimer"};
 
 FakeHost::FakeHost() {
-    // Until a test provides a working service, each name is backed by an
-    // object that answers only the four common slots.
+    // Services the plug-in only holds answer the four common slots.
     for (const char* name : kServiceNames) {
         owned_.push_back(std::make_unique<FakeService<IHostService>>(name, 100));
         services_[name] = owned_.back().get();
     }
+    services_["IMultiTask2"] = static_cast<IMultiTask2*>(&tasks_);
+    services_["ISerialFactory"] = static_cast<ISerialFactory*>(&serial_);
+    services_["IPermanentStorage"] = static_cast<IPermanentStorage*>(&storage_);
 }
 
 FakeHost::~FakeHost() = default;

@@ -3,6 +3,7 @@
 // in order.
 #pragma once
 
+#include <cstdint>
 #include <map>
 #include <memory>
 #include <mutex>
@@ -10,35 +11,26 @@
 #include <string>
 #include <vector>
 
+#include "tests/support/fake_multitask.h"
+#include "tests/support/fake_serial.h"
+#include "tests/support/fake_service.h"
+#include "tests/support/fake_storage.h"
 #include "xtokline/host.h"
 
 namespace xtok::test {
 
-/// The four common slots for any fake service; `Base` is the service's
-/// interface.
-template <class Base>
-class FakeService : public Base {
-public:
-    FakeService(std::string name, int32_t version) : name_(std::move(name)), version_(version) {}
-    void* Destroy(unsigned) override { return this; }
-    void* GetInterface(const char* name) override {
-        return name && name_ == name ? this : nullptr;
-    }
-    const char* GetName() override { return name_.c_str(); }
-    int32_t GetVersion() override { return version_; }
-
-private:
-    std::string name_;
-    int32_t version_;
-};
-
 /// The service names a runtime offers, in the order the module asks for them.
 extern const char* const kServiceNames[9];
 
+/// Every service a runtime offers, backed by the fakes above.
 class FakeHost : public IServiceProvider {
 public:
     FakeHost();
     ~FakeHost();
+
+    FakeMultiTask& tasks() { return tasks_; }
+    FakeSerialFactory& serial() { return serial_; }
+    FakeStorage& storage() { return storage_; }
 
     void* GetService(const char* name) override;
     void ReleaseService(void* service) override;
@@ -57,6 +49,9 @@ public:
 private:
     std::string nameOf(void* service) const;
 
+    FakeSerialFactory serial_;
+    FakeStorage storage_;
+    FakeMultiTask tasks_;  // last: its task threads end before the others go
     std::map<std::string, void*> services_;
     std::vector<std::unique_ptr<IHostService>> owned_;
     std::set<std::string> refused_;

@@ -1,0 +1,96 @@
+#include "protocol/serial_port.h"
+
+#include <thread>
+
+namespace xtok {
+
+namespace {
+const char* const kParityNames[] = {"none", "even", "odd", "mark", "space"};
+const char* const kModeNames[] = {"RS-232", "RS-485", "RS-422", "RS-485P"};
+}  // namespace
+
+const char* parityName(int32_t code) {
+    return code >= 0 && code < 5 ? kParityNames[code] : "none";
+}
+
+const char* modeName(int32_t code) {
+    return code >= 0 && code < 4 ? kModeNames[code] : "RS-232";
+}
+
+bool parityFromName(const std::string& name, int32_t& code) {
+    // "space" exists only on the reporting side.
+    for (int32_t i = 0; i < 4; ++i) {
+        if (name == kParityNames[i]) {
+            code = i;
+            return true;
+        }
+    }
+    return false;
+}
+
+bool modeFromName(const std::string& name, int32_t& code) {
+    // "RS-485P" exists only on the reporting side.
+    for (int32_t i = 0; i < 3; ++i) {
+        if (name == kModeNames[i]) {
+            code = i;
+            return true;
+        }
+    }
+    return false;
+}
+
+std::string settingsText(const std::string& port, const LineSettings& line) {
+    return port + "," + std::to_string(line.baud) + "," + parityName(line.parity) + "," +
+           std::to_string(line.bits) + "," + std::to_string(line.stop) + "," + modeName(line.mode);
+}
+
+bool SerialPort::Open(const std::string& name, const LineSettings& line) {
+    if (!factory_ || IsOpen()) {
+        return IsOpen();
+    }
+    ISerialPort* port = factory_->Open(name.c_str());
+    if (!port) {
+        return false;
+    }
+    if (!port->Configure(line.baud, line.parity, line.bits, line.stop, line.mode)) {
+        factory_->Close(port);
+        return false;
+    }
+    handle_.store(port, std::memory_order_release);
+    return true;
+}
+
+void SerialPort::Close() {
+    ISerialPort* port = handle_.exchange(nullptr);
+    if (!port) {
+        return;
+    }
+    while (users_.load() != 0) {
+        std::this_thread::yield();
+    }
+    factory_->Close(port);
+}
+
+template <class Use>
+bool SerialPort::withPort(Use use) {
+    users_.fetch_add(1);
+    ISerialPort* port = handle_.load();
+    bool ok = port && use(port);
+    users_.fetch_sub(1);
+    return ok;
+}
+
+bool SerialPort::Reconfigure(const LineSettings& line) {
+    return withPort([&line](ISerialPort* port) {
+        return port->Configure(line.baud, line.parity, line.bits, line.stop, line.mode);
+    });
+}
+
+bool SerialPort::Write(const std::string& frame) {
+    return withPort([&frame](ISerialPort* port) {
+        return port->Write(reinterpret_cast<const uint8_t*>(frame.data()),
+                           static_cast<int32_t>(frame.size()), 0);
+    });
+}
+
+}  // namespace xtok

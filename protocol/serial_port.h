@@ -1,0 +1,69 @@
+// The protocol's serial port over the host's ISerialFactory, and the codes in
+// which it holds parity and mode.
+#pragma once
+
+#include <atomic>
+#include <cstdint>
+#include <string>
+
+#include "xtokline/host.h"
+
+namespace xtok {
+
+/// Line settings as handed to the host: parity and mode as codes.
+struct LineSettings {
+    int32_t baud = 0;
+    int32_t parity = 0;  ///< 0 none, 1 even, 2 odd, 3 mark, 4 space
+    int32_t bits = 0;
+    int32_t stop = 0;
+    int32_t mode = 0;  ///< 0 RS-232, 1 RS-485, 2 RS-422, 3 RS-485P
+};
+
+/// Names for reports; unknown codes print as "none" and "RS-232".
+const char* parityName(int32_t code);
+const char* modeName(int32_t code);
+/// Only the names a configuration may use: none, even, odd, mark; and
+/// RS-232, RS-485, RS-422. False for anything else.
+bool parityFromName(const std::string& name, int32_t& code);
+bool modeFromName(const std::string& name, int32_t& code);
+
+/// "port,baud,parity,bits,stop,mode", e.g. "com1,9600,even,8,1,RS-232".
+std::string settingsText(const std::string& port, const LineSettings& line);
+
+class SerialPort {
+public:
+    explicit SerialPort(ISerialFactory* factory) : factory_(factory) {}
+    ~SerialPort() { Close(); }
+    SerialPort(const SerialPort&) = delete;
+    SerialPort& operator=(const SerialPort&) = delete;
+
+    /// Opens and configures; a port whose settings the host refuses is
+    /// closed again and the open fails.
+    bool Open(const std::string& name, const LineSettings& line);
+    void Close();
+    bool IsOpen() const { return handle_.load() != nullptr; }
+    /// Applies new settings to the open port; false when closed or refused.
+    /// Takes no lock, like Write.
+    bool Reconfigure(const LineSettings& line);
+
+    /// One byte with a time-out. The caller holds the lock that keeps
+    /// Open and Close away (the receive task's portLock).
+    bool ReadByte(uint8_t* destination, int32_t timeoutMs) {
+        ISerialPort* port = handle_.load(std::memory_order_acquire);
+        return port && port->ReadByte(destination, timeoutMs, 0);
+    }
+    /// Sends a frame. Transmits take no lock, so a close waits until a
+    /// write that already holds the handle has finished with it.
+    bool Write(const std::string& frame);
+
+private:
+    /// Runs `use` on the open port, keeping Close from freeing it meanwhile.
+    template <class Use>
+    bool withPort(Use use);
+
+    ISerialFactory* factory_;
+    std::atomic<ISerialPort*> handle_{nullptr};
+    std::atomic<int> users_{0};
+};
+
+}  // namespace xtok

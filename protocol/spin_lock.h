@@ -1,0 +1,42 @@
+// A minimal lock for the few values that the receive task, the runtime's
+// threads and the console share without a host lock: the framing texts and
+// the settings stores. Held only for a copy or a map lookup, so spinning is
+// cheaper than a host lock and needs no operating-system call.
+#pragma once
+
+#include <atomic>
+#include <mutex>
+#include <string>
+
+namespace xtok {
+
+class SpinLock {
+public:
+    void lock() {
+        while (flag_.test_and_set(std::memory_order_acquire)) {
+        }
+    }
+    void unlock() { flag_.clear(std::memory_order_release); }
+
+private:
+    std::atomic_flag flag_ = ATOMIC_FLAG_INIT;
+};
+
+/// A text that one thread may replace while others read it.
+class SharedText {
+public:
+    std::string get() const {
+        std::lock_guard<SpinLock> guard(lock_);
+        return text_;
+    }
+    void set(std::string text) {
+        std::lock_guard<SpinLock> guard(lock_);
+        text_.swap(text);
+    }
+
+private:
+    mutable SpinLock lock_;
+    std::string text_;
+};
+
+}  // namespace xtok

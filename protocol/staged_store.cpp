@@ -1,0 +1,106 @@
+#include "protocol/staged_store.h"
+
+#include <mutex>
+#include <vector>
+
+#include "protocol/retained_store.h"
+
+namespace xtok {
+
+std::string StagedStore::stagedKey(const std::string& name, int32_t node) {
+    return node == -1 ? name : name + std::to_string(node);
+}
+
+void StagedStore::stage(StagedValue value) {
+    std::string key = stagedKey(value.name, value.node);
+    std::lock_guard<SpinLock> guard(lock_);
+    entries_[key] = std::move(value);
+}
+
+void StagedStore::stageBool(const std::string& name, int32_t node, bool value) {
+    StagedValue v;
+    v.kind = 0;
+    v.name = name;
+    v.boolValue = value;
+    v.node = node;
+    stage(std::move(v));
+}
+
+void StagedStore::stageInt(const std::string& name, int32_t node, int32_t value) {
+    StagedValue v;
+    v.kind = 1;
+    v.name = name;
+    v.intValue = value;
+    v.node = node;
+    stage(std::move(v));
+}
+
+void StagedStore::stageText(const std::string& name, int32_t node, const std::string& value) {
+    StagedValue v;
+    v.kind = 2;
+    v.name = name;
+    v.textValue = value;
+    v.node = node;
+    stage(std::move(v));
+}
+
+bool StagedStore::find(const std::string& name, int32_t node, StagedValue& out) const {
+    std::lock_guard<SpinLock> guard(lock_);
+    auto it = entries_.find(stagedKey(name, node));
+    if (it == entries_.end()) {
+        return false;
+    }
+    out = it->second;
+    return true;
+}
+
+bool StagedStore::findBool(const std::string& name, int32_t node, bool& out) const {
+    StagedValue v;
+    if (!find(name, node, v)) {
+        return false;
+    }
+    out = v.boolValue;
+    return true;
+}
+
+bool StagedStore::findInt(const std::string& name, int32_t node, int32_t& out) const {
+    StagedValue v;
+    if (!find(name, node, v)) {
+        return false;
+    }
+    out = v.intValue;
+    return true;
+}
+
+bool StagedStore::findText(const std::string& name, int32_t node, std::string& out) const {
+    StagedValue v;
+    if (!find(name, node, v)) {
+        return false;
+    }
+    out = v.textValue;
+    return true;
+}
+
+void StagedStore::commitTo(RetainedStore& store, int32_t node, bool persist) const {
+    std::vector<StagedValue> values;
+    {
+        // Copied out so that the storage writes run without holding the lock.
+        std::lock_guard<SpinLock> guard(lock_);
+        for (const auto& [key, value] : entries_) {
+            if (value.node == node) {
+                values.push_back(value);
+            }
+        }
+    }
+    for (const StagedValue& v : values) {
+        if (v.kind == 0) {
+            store.setBool(v.name, node, v.boolValue, persist);
+        } else if (v.kind == 1) {
+            store.setInt(v.name, node, v.intValue, persist);
+        } else {
+            store.setText(v.name, node, v.textValue, persist);
+        }
+    }
+}
+
+}  // namespace xtok
