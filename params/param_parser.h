@@ -52,6 +52,9 @@ public:
     const std::string& text() const { return text_; }
 
 private:
+    void scanNodes();
+    void addNode(int32_t node);
+
     std::string text_;
     std::string lastValue_;
     std::vector<int32_t> nodes_;
@@ -73,12 +76,12 @@ int readBool(ParamParser& parser, const std::string& name, int32_t node, bool& o
 /// Reporting getters: true on success (codes 0 and 1, or 2 when optional);
 /// otherwise the message goes to `errorText` and the result is false. `out`
 /// keeps what the caller preset unless a value was read.
-bool getParamString(ParamParser& parser, const std::string& name, int32_t node,
-                    std::string& out, int flags, bool optional, std::string& errorText);
+bool getParamString(ParamParser& parser, const std::string& name, int32_t node, std::string& out,
+                    int flags, bool optional, std::string& errorText);
 bool getParamInt(ParamParser& parser, const std::string& name, int32_t node, int32_t& out,
                  int flags, bool optional, std::string& errorText);
-bool getParamBool(ParamParser& parser, const std::string& name, int32_t node, bool& out,
-                  int flags, bool optional, std::string& errorText);
+bool getParamBool(ParamParser& parser, const std::string& name, int32_t node, bool& out, int flags,
+                  bool optional, std::string& errorText);
 
 /// "Parser: parameter '<name>' <reason of code>".
 std::string paramErrorText(int code, const std::string& name);
