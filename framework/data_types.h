@@ -1,0 +1,84 @@
+// The fixed table of data types and the data type text of a tag address,
+// e.g. "unsignedShort", "byte-16" or "short-4(swap2,neg)".
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace xtok {
+
+/// Data type codes. A name ending in "-" is an array (or string) whose length
+/// follows it in the text.
+enum DataTypeCode : int32_t {
+    kBoolean = 1,
+    kByte = 2,
+    kShort = 3,
+    kInt = 4,
+    kUnsignedByte = 5,
+    kUnsignedShort = 6,
+    kUnsignedInt = 7,
+    kFloat = 8,
+    kDouble = 9,
+    kString = 10,
+    kBinary = 11,
+    kTime = 12,
+    kBooleanArray = 13,
+    kByteArray = 14,
+    kShortArray = 15,
+    kIntArray = 16,
+    kUnsignedByteArray = 17,
+    kUnsignedShortArray = 18,
+    kUnsignedIntArray = 19,
+    kFloatArray = 20,
+    kDoubleArray = 21,
+    kTimeArray = 22,
+    kUint64 = 23,
+    kInt64 = 24,
+    kUint64Array = 25,
+    kInt64Array = 26,
+    kObject = 27,
+};
+
+/// The largest datum a data type text may describe, in bytes (in bits for
+/// the bit types). Far beyond any token or panel variable, and small enough
+/// that size arithmetic never overflows 32 bits; a longer text is refused as
+/// an unknown type rather than allocating without bound.
+constexpr int32_t kMaxDataSize = 1000000;
+
+/// A parsed data type text.
+struct DataType {
+    int32_t code = 0;
+    int32_t elementCode = 0;               ///< non-zero exactly for arrays and strings
+    int32_t size = 0;                      ///< bytes; bits for the bit types
+    std::vector<std::string> conversions;  ///< in the order written
+};
+
+/// False for an unknown name, a "(" without ")" or a size above kMaxDataSize;
+/// `type` is then unspecified.
+bool ParseDataType(const std::string& text, DataType& type);
+
+/// The inverse of the parse for a code and a total size in bytes: "byte-16"
+/// for (kByteArray, 16); "??" for an unknown code.
+std::string DataTypeName(int32_t code, int32_t size);
+
+/// The code's bit in a mask of allowed types; 0 for an unknown code.
+uint32_t DataTypeBit(int32_t code);
+
+/// Bytes of one value of the code; 0 for arrays, strings, objects and
+/// unknown codes.
+int32_t ElementSize(int32_t code);
+
+/// Codes whose values are bits, packed in the raw bytes.
+bool IsBitType(int32_t code);
+
+/// The code that an element of the datum has: the element code for arrays,
+/// the code itself for scalars.
+inline int32_t EffectiveElementCode(int32_t code, int32_t elementCode) {
+    return elementCode != 0 ? elementCode : code;
+}
+
+/// Number of elements of a datum of `size`: 1 for scalars.
+int32_t ElementCount(int32_t elementCode, int32_t size);
+
+}  // namespace xtok
