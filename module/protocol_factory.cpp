@@ -1,6 +1,10 @@
 #include "module/protocol_factory.h"
 
 #include <cstring>
+#include <new>
+
+#include "module/service_table.h"
+#include "protocol/protocol_xtok.h"
 
 namespace xtok {
 
@@ -17,8 +21,20 @@ void* ProtocolFactory::GetInterface(const char* name) {
     return nullptr;
 }
 
-IProtocol7* ProtocolFactory::CreateProtocol(const char*) {
-    return nullptr;
+IProtocol7* ProtocolFactory::CreateProtocol(const char* name) {
+    if (!name || std::strcmp(name, "XTOK") != 0) {
+        return nullptr;
+    }
+    // A protocol takes its locks and port from the services Init acquired;
+    // without them it could not run, so none is made.
+    if (!services().multiTask || !services().serialFactory) {
+        return nullptr;
+    }
+    try {
+        return new Protocol_XTOK();
+    } catch (const std::bad_alloc&) {
+        return nullptr;
+    }
 }
 
 void ProtocolFactory::DestroyProtocol(IProtocol7* protocol) {

@@ -50,11 +50,10 @@ std::string hexTextToBytes(const std::string& text) {
     return bytes;
 }
 
-std::string bytesToHexText(const std::string& bytes) {
+std::string bytesToHexText(const char* bytes, std::size_t length) {
     static const char digits[] = "0123456789ABCDEF";
-    std::string text;
-    text.resize(bytes.size() * 2);
-    for (std::size_t i = 0; i < bytes.size(); ++i) {
+    std::string text(length * 2, '\0');
+    for (std::size_t i = 0; i < length; ++i) {
         unsigned char b = static_cast<unsigned char>(bytes[i]);
         text[2 * i] = digits[b >> 4];
         text[2 * i + 1] = digits[b & 0x0F];

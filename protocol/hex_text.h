@@ -2,6 +2,7 @@
 // form of the framing prefixes and suffixes, and of tokens in hex mode.
 #pragma once
 
+#include <cstddef>
 #include <string>
 
 namespace xtok {
@@ -15,6 +16,6 @@ bool isHexText(const std::string& text);
 std::string hexTextToBytes(const std::string& text);
 
 /// Two upper-case hex digits per byte.
-std::string bytesToHexText(const std::string& bytes);
+std::string bytesToHexText(const char* bytes, std::size_t length);
 
 }  // namespace xtok
