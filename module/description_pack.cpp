@@ -13,7 +13,8 @@
 
 namespace {
 
-const char kHeader[] = "<<ICOM_XML_START>>Name=XTOK?FullName=Xtokline?Version=106?Platform=PX40_WCE6";
+const char kHeader[] =
+    "<<ICOM_XML_START>>Name=XTOK?FullName=Xtokline?Version=106?Platform=PX40_WCE6";
 const char kEnd[] = "<<ICOM_XML_END>>";
 
 bool readFile(const char* path, std::string& out) {

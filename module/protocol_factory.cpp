@@ -14,8 +14,8 @@ void* ProtocolFactory::Destroy(unsigned) {
 }
 
 void* ProtocolFactory::GetInterface(const char* name) {
-    if (name && (std::strcmp(name, "ProtocolFactory") == 0 ||
-                 std::strcmp(name, "IProtocolFactory") == 0)) {
+    if (name &&
+        (std::strcmp(name, "ProtocolFactory") == 0 || std::strcmp(name, "IProtocolFactory") == 0)) {
         return this;
     }
     return nullptr;

@@ -42,7 +42,9 @@ bool parseDecimal(const std::string& word, int32_t& out) {
     if (end == begin) {
         return false;
     }
-    out = static_cast<int32_t>(value > INT32_MAX ? INT32_MAX : value < INT32_MIN ? INT32_MIN : value);
+    out = static_cast<int32_t>(value > INT32_MAX   ? INT32_MAX
+                               : value < INT32_MIN ? INT32_MIN
+                                                   : value);
     return true;
 }
 

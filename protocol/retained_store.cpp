@@ -39,8 +39,8 @@ void RetainedStore::setSection(const std::string& section) {
     section_ = section;
 }
 
-RetainedValue RetainedStore::load(const std::string& section, const std::string& key,
-                                  int32_t kind, const RetainedValue& def) {
+RetainedValue RetainedStore::load(const std::string& section, const std::string& key, int32_t kind,
+                                  const RetainedValue& def) {
     IPermanentStorage* storage = services().permanentStorage;
     if (!storage || !storage->IsStored(section.c_str(), key.c_str())) {
         return def;

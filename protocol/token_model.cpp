@@ -61,10 +61,10 @@ Model buildTokenModel() {
 }
 
 bool isSettingsTypeName(const std::string& name) {
-    static const char* const names[] = {"SP_Baud",     "SP_Par",      "SP_Bits",     "SP_Stop",
-                                        "SP_Mode",     "SP_RxPrefix", "SP_RxSuffix", "SP_TxPrefix",
-                                        "SP_TxSuffix", "SP_Gap",      "SP_HexTokens", "SP_Done",
-                                        "SP_TokenQueueSize"};
+    static const char* const names[] = {
+        "SP_Baud",      "SP_Par",      "SP_Bits",          "SP_Stop",     "SP_Mode",
+        "SP_RxPrefix",  "SP_RxSuffix", "SP_TxPrefix",      "SP_TxSuffix", "SP_Gap",
+        "SP_HexTokens", "SP_Done",     "SP_TokenQueueSize"};
     for (const char* n : names) {
         if (name == n) {
             return true;

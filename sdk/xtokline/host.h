@@ -171,8 +171,7 @@ public:
     virtual int32_t Reserved13() = 0;
     /// slot 14: copies the stored text with its zero into `buffer` of `size`
     /// bytes. False when nothing is stored or the text does not fit.
-    virtual bool ReadTextTo(const char* section, const char* key, char* buffer,
-                            int32_t size) = 0;
+    virtual bool ReadTextTo(const char* section, const char* key, char* buffer, int32_t size) = 0;
 };
 
 /// Services the plug-in holds but never calls beyond the four common slots.

@@ -108,15 +108,33 @@ TEST_F(DescriptionBlock, DocumentIsWholeUtf8XmlWithLineFeeds) {
 
 TEST_F(DescriptionBlock, CapabilitiesAndIdentity) {
     const std::vector<std::pair<std::string, std::string>> fields = {
-        {"usesUart", "true"},         {"usesEthernet", "false"},    {"usesNetwork", "false"},
-        {"usesDatagram", "false"},    {"canWriteDatagram", "false"}, {"canMultipleRead", "false"},
-        {"canMultipleWrite", "false"}, {"usesTags", "false"},       {"isReentrant", "true"},
-        {"isConverted", "false"},     {"isProtgen", "true"},        {"usesTask", "true"},
-        {"usesSemaphore", "true"},    {"usesDoCommand", "true"},    {"usesExtend", "true"},
-        {"inheritsProtgen", "false"}, {"usesOfflineOpt", "false"},  {"name", "XTOK"},
-        {"display", "Xtokline"},      {"compatibilityCode", ""},    {"displayDlgTitle", "Xtokline"},
-        {"protGenVer", "213"},        {"code", "471"},              {"maxDisplayRows", "14"},
-        {"defaultOrt", "30000"},      {"minimumOrt", "1000"},       {"defaultRpt", "3"}};
+        {"usesUart", "true"},
+        {"usesEthernet", "false"},
+        {"usesNetwork", "false"},
+        {"usesDatagram", "false"},
+        {"canWriteDatagram", "false"},
+        {"canMultipleRead", "false"},
+        {"canMultipleWrite", "false"},
+        {"usesTags", "false"},
+        {"isReentrant", "true"},
+        {"isConverted", "false"},
+        {"isProtgen", "true"},
+        {"usesTask", "true"},
+        {"usesSemaphore", "true"},
+        {"usesDoCommand", "true"},
+        {"usesExtend", "true"},
+        {"inheritsProtgen", "false"},
+        {"usesOfflineOpt", "false"},
+        {"name", "XTOK"},
+        {"display", "Xtokline"},
+        {"compatibilityCode", ""},
+        {"displayDlgTitle", "Xtokline"},
+        {"protGenVer", "213"},
+        {"code", "471"},
+        {"maxDisplayRows", "14"},
+        {"defaultOrt", "30000"},
+        {"minimumOrt", "1000"},
+        {"defaultRpt", "3"}};
     std::size_t at = 0;
     for (const auto& [name, value] : fields) {
         std::string element = "\t<" + name + ">" + value + "</" + name + ">\n";
@@ -137,10 +155,12 @@ TEST_F(DescriptionBlock, Parameters) {
         {"CfgVer", "none", "prop_integer", "", "1", true, false, "none", 0},
         {"model", "Model", "prop_modelRef", "", "1", true, true, "none", 0},
         {"port", "Port", "prop_list", "prop_string", "com1", true, false, "communications", 16},
-        {"baudrate", "Baudrate", "prop_list", "prop_integer", "9600", true, false, "communications", 11},
+        {"baudrate", "Baudrate", "prop_list", "prop_integer", "9600", true, false, "communications",
+         11},
         {"parity", "Parity", "prop_list", "prop_string", "even", true, false, "communications", 3},
         {"bits", "Data bits", "prop_list", "prop_integer", "8", true, false, "communications", 2},
-        {"stopbits", "Stop bits", "prop_list", "prop_integer", "1", true, false, "communications", 2},
+        {"stopbits", "Stop bits", "prop_list", "prop_integer", "1", true, false, "communications",
+         2},
         {"mode", "Mode", "prop_list", "prop_string", "RS-232", true, false, "communications", 3},
         {"rx_prefix", "Rx Token Prefix", "prop_string", "", "", false, false, "none", 0},
         {"rx_suffix", "Rx Token Suffix", "prop_string", "", "", false, false, "none", 0},
@@ -148,7 +168,8 @@ TEST_F(DescriptionBlock, Parameters) {
         {"tx_prefix", "Tx Token Prefix", "prop_string", "", "", false, false, "none", 0},
         {"tx_suffix", "Tx Token Suffix", "prop_string", "", "", false, false, "none", 0},
         {"hex_tokens", "Hexadecimal Tokens", "prop_bool", "", "false", false, false, "none", 0},
-        {"token_queue_size", "Token Queue Size", "prop_integer", "", "100", false, false, "none", 0},
+        {"token_queue_size", "Token Queue Size", "prop_integer", "", "100", false, false, "none",
+         0},
         {"autoConnect", "ConnectAtPowerUp", "prop_bool", "", "true", false, false, "none", 0},
     };
     std::vector<Element> params = elements(xml, "parameter");
@@ -187,9 +208,11 @@ TEST_F(DescriptionBlock, MemoryTypes) {
         bool readOnly, writeOnly;
     };
     const Expected expected[] = {
-        {"tx_token", "Token To Send", "byte", "0x200", "999999999", "999999999", "999999999", false, true},
+        {"tx_token", "Token To Send", "byte", "0x200", "999999999", "999999999", "999999999", false,
+         true},
         {"rx_token", "Token Received", "byte", "0x200", "999999999", "999999999", "0", true, false},
-        {"rx_token_len", "Length of Token Received", "unsignedInt", "0x40", "999999999", "999999999", "0", true, false},
+        {"rx_token_len", "Length of Token Received", "unsignedInt", "0x40", "999999999",
+         "999999999", "0", true, false},
         {"tokens_available", "Tokens Available", "unsignedInt", "0x40", "1", "0", "0", true, false},
         {"token_ack", "Token Acknowledge", "boolean", "0x1", "1", "0", "0", false, true},
         {"connect", "Connect", "boolean", "0x1", "1", "0", "0", false, false},
@@ -204,7 +227,8 @@ TEST_F(DescriptionBlock, MemoryTypes) {
         {"SP_TxPrefix", "Tx Token Prefix", "byte", "0x200", "9999", "9999", "9999", false, false},
         {"SP_TxSuffix", "Tx Token Suffix", "byte", "0x200", "9999", "9999", "9999", false, false},
         {"SP_HexTokens", "Hexadecimal Tokens", "boolean", "0x1", "1", "0", "0", false, false},
-        {"SP_TokenQueueSize", "Token Queue Size", "unsignedInt", "0x40", "1", "0", "0", false, false},
+        {"SP_TokenQueueSize", "Token Queue Size", "unsignedInt", "0x40", "1", "0", "0", false,
+         false},
         {"SP_Done", "Serial Done", "boolean", "0x1", "1", "0", "0", false, false},
     };
     std::vector<Element> types = elements(xml, "memtype");
@@ -262,11 +286,11 @@ TEST_F(DescriptionBlock, TagFieldsModelAndConversions) {
     EXPECT_EQ(models[0].attributes["datagramLength"], "0");
 
     const std::vector<std::pair<std::string, std::string>> refs = {
-        {"tx_token", "999999999"}, {"rx_token", "999999999"}, {"rx_token_len", "1"},
-        {"tokens_available", "1"}, {"token_ack", "1"},        {"SP_Baud", "1"},
-        {"SP_Bits", "1"},          {"SP_Stop", "1"},          {"SP_Par", "1"},
-        {"SP_Mode", "1"},          {"SP_RxPrefix", "9999"},   {"SP_RxSuffix", "9999"},
-        {"SP_Gap", "1"},           {"SP_TxPrefix", "9999"},   {"SP_TxSuffix", "9999"},
+        {"tx_token", "999999999"}, {"rx_token", "999999999"},  {"rx_token_len", "1"},
+        {"tokens_available", "1"}, {"token_ack", "1"},         {"SP_Baud", "1"},
+        {"SP_Bits", "1"},          {"SP_Stop", "1"},           {"SP_Par", "1"},
+        {"SP_Mode", "1"},          {"SP_RxPrefix", "9999"},    {"SP_RxSuffix", "9999"},
+        {"SP_Gap", "1"},           {"SP_TxPrefix", "9999"},    {"SP_TxSuffix", "9999"},
         {"SP_HexTokens", "1"},     {"SP_TokenQueueSize", "1"}, {"SP_Done", "1"},
         {"connect", "1"}};
     std::vector<Element> found = elements(xml, "memtype_ref");

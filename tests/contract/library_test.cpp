@@ -14,7 +14,13 @@ namespace {
 
 // Slot numbers of the contract, written out as a foreign runtime knows them.
 enum RootSlot { kRootGetInterface = 0, kRootRelease = 1 };
-enum FactorySlot { kGetInterface = 1, kGetName = 2, kGetVersion = 3, kCreate = 4, kDestroyProtocol = 5 };
+enum FactorySlot {
+    kGetInterface = 1,
+    kGetName = 2,
+    kGetVersion = 3,
+    kCreate = 4,
+    kDestroyProtocol = 5
+};
 enum ModuleSlot { kInit = 4, kExit = 5, kErrorText = 6 };
 
 class Library : public ::testing::Test {

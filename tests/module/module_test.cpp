@@ -14,9 +14,9 @@ namespace {
 using test::FakeHost;
 using Calls = std::vector<std::string>;
 
-const Calls kAllGets = {"get IMultiTask2", "get ISerialFactory", "get ISocketFactory",
-                        "get ICDSBuffer",  "get IDiag",          "get IPermanentStorage",
-                        "get IDriverInterface", "get ISmux",     "get IFastTimer"};
+const Calls kAllGets = {"get IMultiTask2",      "get ISerialFactory", "get ISocketFactory",
+                        "get ICDSBuffer",       "get IDiag",          "get IPermanentStorage",
+                        "get IDriverInterface", "get ISmux",          "get IFastTimer"};
 
 struct MissingRequired {
     const char* service;
@@ -51,11 +51,11 @@ INSTANTIATE_TEST_SUITE_P(
                         "ISocketFactory not created",
                         {"get IMultiTask2", "get ISerialFactory", "get ISocketFactory",
                          "release IMultiTask2", "release ISerialFactory"}},
-        MissingRequired{"ICDSBuffer",
-                        "piCDSBuffer not created",
-                        {"get IMultiTask2", "get ISerialFactory", "get ISocketFactory",
-                         "get ICDSBuffer", "release IMultiTask2", "release ISerialFactory",
-                         "release ISocketFactory"}}));
+        MissingRequired{
+            "ICDSBuffer",
+            "piCDSBuffer not created",
+            {"get IMultiTask2", "get ISerialFactory", "get ISocketFactory", "get ICDSBuffer",
+             "release IMultiTask2", "release ISerialFactory", "release ISocketFactory"}}));
 
 TEST(ModuleInit, AcquiresInOrderAndReleasesInTheDocumentedOrder) {
     FakeHost host;
@@ -79,7 +79,8 @@ TEST(ModuleInit, AcquiresInOrderAndReleasesInTheDocumentedOrder) {
 
 TEST(ModuleInit, OptionalServicesMayBeMissing) {
     FakeHost host;
-    for (const char* name : {"IDiag", "IPermanentStorage", "IDriverInterface", "ISmux", "IFastTimer"}) {
+    for (const char* name :
+         {"IDiag", "IPermanentStorage", "IDriverInterface", "ISmux", "IFastTimer"}) {
         host.refuse(name);
     }
     ProtModule module;

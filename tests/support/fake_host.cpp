@@ -2,9 +2,9 @@
 
 namespace xtok::test {
 
-const char* const kServiceNames[9] = {"IMultiTask2", "ISerialFactory", "ISocketFactory",
-                                      "ICDSBuffer",  "IDiag",          "IPermanentStorage",
-                                      "IDriverInterface", "ISmux",     "IFastTimer"};
+const char* const kServiceNames[9] = {"IMultiTask2",      "ISerialFactory", "ISocketFactory",
+                                      "ICDSBuffer",       "IDiag",          "IPermanentStorage",
+                                      "IDriverInterface", "ISmux",          "IFastTimer"};
 
 FakeHost::FakeHost() {
     // Services the plug-in only holds answer the four common slots.

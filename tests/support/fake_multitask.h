@@ -20,7 +20,8 @@ class FakeMultiTask;
 
 class FakeTask final : public ITask {
 public:
-    FakeTask(IRunnable* body, int32_t priority, int32_t flags) : body_(body), priority_(priority), flags_(flags) {}
+    FakeTask(IRunnable* body, int32_t priority, int32_t flags)
+        : body_(body), priority_(priority), flags_(flags) {}
     ~FakeTask();
     void* Destroy(unsigned) override { return this; }
     int32_t Reserved1() override { return 0; }

@@ -71,7 +71,7 @@ public:
     int closes() const;
     bool isOpen() const;
     std::vector<LineSettings> configured() const;
-    std::string written() const;  ///< all bytes written, in order
+    std::string written() const;              ///< all bytes written, in order
     std::vector<std::string> writes() const;  ///< one entry per Write call
     std::vector<std::string> openedNames() const;
     /// Time-out arguments seen by ReadByte, most recent last (bounded).

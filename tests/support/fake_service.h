@@ -15,9 +15,7 @@ class FakeService : public Base {
 public:
     FakeService(std::string name, int32_t version) : name_(std::move(name)), version_(version) {}
     void* Destroy(unsigned) override { return this; }
-    void* GetInterface(const char* name) override {
-        return name && name_ == name ? this : nullptr;
-    }
+    void* GetInterface(const char* name) override { return name && name_ == name ? this : nullptr; }
     const char* GetName() override { return name_.c_str(); }
     int32_t GetVersion() override { return version_; }
 
