@@ -53,7 +53,7 @@ private:
     FakeStorage storage_;
     FakeMultiTask tasks_;  // last: its task threads end before the others go
     std::map<std::string, void*> services_;
-    std::vector<std::unique_ptr<IHostService>> owned_;
+    std::vector<std::unique_ptr<FakeService<IHostService>>> owned_;
     std::set<std::string> refused_;
     mutable std::mutex mutex_;
     std::vector<std::string> calls_;
