@@ -4,6 +4,7 @@
 
 #include <chrono>
 #include <cstring>
+#include <ostream>
 #include <string>
 #include <thread>
 #include <vector>
@@ -180,6 +181,10 @@ struct Exchange {
     std::string answer;    // written to tx_token
     std::string lineGets;  // what the device receives
 };
+
+void PrintTo(const Exchange& e, std::ostream* os) {
+    *os << e.name;
+}
 
 class TypicalExchange : public ::testing::TestWithParam<Exchange> {};
 

@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include <ostream>
 #include <string>
 #include <vector>
 
@@ -23,6 +24,10 @@ struct MissingRequired {
     const char* text;
     Calls calls;
 };
+
+void PrintTo(const MissingRequired& c, std::ostream* os) {
+    *os << c.service;
+}
 
 class InitFailure : public ::testing::TestWithParam<MissingRequired> {};
 

@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include <ostream>
 #include <string>
 
 #include "protocol/xtok_config.h"
@@ -15,6 +16,10 @@ struct Failing {
     std::string message;
 };
 
+void PrintTo(const Failing& c, std::ostream* os) {
+    *os << c.message;
+}
+
 class ConfigFailure : public ::testing::TestWithParam<Failing> {};
 
 TEST_P(ConfigFailure, SaysWhy) {
@@ -29,7 +34,8 @@ INSTANTIATE_TEST_SUITE_P(
         Failing{"model=1 port=com1", "Parser: unknown format"},
         Failing{"CfgVer=1 port=com1", "Parser: parameter 'model' is not found"},
         Failing{"CfgVer=1 model=1 baudrate=9600", "Parser: parameter 'port' is not found"},
-        Failing{"CfgVer=1 model=1 port=com1 parity=even", "Parser: parameter 'baudrate' is not found"},
+        Failing{"CfgVer=1 model=1 port=com1 parity=even",
+                "Parser: parameter 'baudrate' is not found"},
         Failing{"CfgVer=1 model=1 port=com1 baudrate=9600 bits=8",
                 "Parser: parameter 'parity' is not found"},
         Failing{"CfgVer=1 model=1 port=com1 baudrate=9600 parity=even stopbits=1",
@@ -55,7 +61,8 @@ INSTANTIATE_TEST_SUITE_P(
         // Only the first bad text, in the order rx, then tx, is reported.
         Failing{kRequired + " tx_prefix=1 rx_suffix=1", "rx_suffix not in hex format"},
         Failing{kRequired + " hex_tokens=TRUE", "Parser: parameter 'hex_tokens' has illegal value"},
-        Failing{kRequired + " autoConnect=1", "Parser: parameter 'autoConnect' has illegal value"}));
+        Failing{kRequired + " autoConnect=1",
+                "Parser: parameter 'autoConnect' has illegal value"}));
 
 TEST(Config, DefaultsOfTheOptionalKeys) {
     XtokConfig config;
@@ -96,8 +103,9 @@ TEST(Config, OptionalKeysAreRead) {
 
 TEST(Config, ParityAndModeTextsAreKeptForTheProtocolToDecode) {
     XtokConfig config;
-    std::string text = "CfgVer=1 model=1 port=/dev/ttyUSB0 baudrate=115200 parity=mark bits=7 "
-                       "stopbits=2 mode=RS-485";
+    std::string text =
+        "CfgVer=1 model=1 port=/dev/ttyUSB0 baudrate=115200 parity=mark bits=7 "
+        "stopbits=2 mode=RS-485";
     ASSERT_TRUE(config.Parse(text));
     EXPECT_EQ(config.GetCommon().parity, "mark");
     EXPECT_EQ(config.GetCommon().mode, "RS-485");
@@ -118,8 +126,9 @@ TEST(Config, NodeSectionsAndFindNode) {
 
 TEST(Config, WithoutNodeSectionsEveryNodeIsTheDefault) {
     XtokConfig config;
-    ASSERT_TRUE(config.Parse("CfgVer=1 model=2 port=com1 baudrate=9600 parity=even bits=8 "
-                             "stopbits=1 mode=RS-232"));
+    ASSERT_TRUE(
+        config.Parse("CfgVer=1 model=2 port=com1 baudrate=9600 parity=even bits=8 "
+                     "stopbits=1 mode=RS-232"));
     EXPECT_TRUE(config.nodes().empty());
     EXPECT_EQ(config.FindNode(0).model, "2");
 }
