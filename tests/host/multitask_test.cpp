@@ -1,0 +1,155 @@
+// Tasks and locks on real threads. Nothing here waits for time to pass except
+// the one StopTask whose time-out is the point of the test.
+#include <gtest/gtest.h>
+
+#include <future>
+#include <thread>
+#include <vector>
+
+#include "host/multitask.h"
+#include "tests/host/notice_log.h"
+
+namespace xtok::host {
+namespace {
+
+/// A task body that waits until the test lets it go, then runs until it is
+/// asked to stop.
+class Body : public IRunnable {
+public:
+    explicit Body(bool letGo = true) {
+        if (letGo) {
+            release();
+        }
+    }
+    void* Destroy(unsigned) override { return this; }
+    bool Run() override {
+        started_.set_value();
+        released_.wait();
+        while (!task->IsStopRequested()) {
+            std::this_thread::yield();
+        }
+        finished_.set_value();  // the body's last touch of itself
+        return true;
+    }
+
+    ITask* task = nullptr;
+    void waitStarted() { started_.get_future().wait(); }
+    void release() { release_.set_value(); }
+    void waitFinished() { finished_.get_future().wait(); }
+
+private:
+    std::promise<void> started_, release_, finished_;
+    std::shared_future<void> released_{release_.get_future().share()};
+};
+
+ITask* startTask(MultiTask& tasks, Body& body) {
+    body.task = tasks.CreateTask(&body, 3, 0);
+    if (body.task && body.task->Start()) {
+        body.waitStarted();
+    }
+    return body.task;
+}
+
+TEST(Tasks, RunOnTheirOwnThreadUntilStopped) {
+    MultiTask tasks;
+    Body body;
+    ITask* task = startTask(tasks, body);
+    ASSERT_NE(task, nullptr);
+    EXPECT_FALSE(task->Start());  // once only
+    EXPECT_EQ(tasks.liveTasks(), 1);
+    EXPECT_TRUE(tasks.StopTask(task, 10000));
+    EXPECT_EQ(tasks.liveTasks(), 0);
+    // The handle is gone; a second stop must not touch it again.
+    EXPECT_FALSE(tasks.StopTask(task, 0));
+}
+
+TEST(Tasks, StopTimesOutWhileTheBodyRunsAndSucceedsLater) {
+    MultiTask tasks;
+    Body body(false);
+    ITask* task = startTask(tasks, body);
+    ASSERT_NE(task, nullptr);
+    EXPECT_FALSE(tasks.StopTask(task, 20));
+    EXPECT_EQ(tasks.liveTasks(), 1);
+    body.release();
+    EXPECT_TRUE(tasks.StopTask(task, 10000));
+    EXPECT_EQ(tasks.liveTasks(), 0);
+}
+
+TEST(Tasks, NeverStartedTaskStopsAtOnce) {
+    MultiTask tasks;
+    Body body;
+    ITask* task = tasks.CreateTask(&body, 3, 0);
+    ASSERT_NE(task, nullptr);
+    EXPECT_FALSE(task->IsStopRequested());
+    EXPECT_TRUE(tasks.StopTask(task, 0));
+    EXPECT_EQ(tasks.CreateTask(nullptr, 3, 0), nullptr);
+}
+
+TEST(Tasks, ShutdownLeavesAStuckTaskRunningWithAValidHandle) {
+    test::NoticeLog notices;
+    Body body(false);
+    {
+        MultiTask tasks(notices.sink(), 10);
+        ASSERT_NE(startTask(tasks, body), nullptr);
+    }
+    EXPECT_EQ(notices.count("did not stop"), 1);
+    // The body outlives the service and can still ask its handle.
+    body.release();
+    body.waitFinished();
+}
+
+TEST(Locks, AreRecursiveAndExcludeOtherThreads) {
+    MultiTask tasks;
+    IMutex* mutex = tasks.CreateMutex(0);
+    ASSERT_NE(mutex, nullptr);
+    auto otherThreadGetsIt = [mutex] {
+        bool got = false;
+        std::thread([&] {
+            got = mutex->TryLock();
+            if (got) {
+                mutex->Unlock();
+            }
+        }).join();
+        return got;
+    };
+    mutex->Lock();
+    EXPECT_TRUE(mutex->TryLock());
+    mutex->Lock();
+    EXPECT_FALSE(otherThreadGetsIt());
+    mutex->Unlock();
+    mutex->Unlock();
+    EXPECT_FALSE(otherThreadGetsIt());
+    mutex->Unlock();
+    EXPECT_TRUE(otherThreadGetsIt());
+    tasks.DestroyMutex(mutex);
+}
+
+TEST(Locks, KeepCountsExactUnderContention) {
+    MultiTask tasks;
+    IMutex* mutex = tasks.CreateMutex(0);
+    constexpr int kThreads = 4;
+    constexpr int kRounds = 50000;
+    long counter = 0;  // deliberately not atomic: only the lock protects it
+    std::vector<std::thread> threads;
+    for (int t = 0; t < kThreads; ++t) {
+        threads.emplace_back([&] {
+            for (int i = 0; i < kRounds; ++i) {
+                mutex->Lock();
+                mutex->Lock();
+                ++counter;
+                mutex->Unlock();
+                mutex->Unlock();
+            }
+        });
+    }
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+    EXPECT_EQ(counter, long{kThreads} * kRounds);
+    EXPECT_TRUE(mutex->TryLock());
+    mutex->Unlock();
+    tasks.DestroyMutex(mutex);
+}
+
+}  // namespace
+}  // namespace xtok::host
