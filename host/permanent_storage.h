@@ -1,0 +1,55 @@
+// "IPermanentStorage" / "IPermanentStorage2": typed values in one SQLite file.
+#pragma once
+
+#include <memory>
+#include <mutex>
+#include <string>
+
+#include "host/host_service.h"
+
+struct sqlite3;
+struct sqlite3_stmt;
+
+namespace xtok::host {
+
+/// $XDG_STATE_HOME/xtokline/retained.sqlite3, else
+/// ~/.local/state/xtokline/retained.sqlite3; "" when neither variable is set.
+std::string defaultStoragePath();
+
+class PermanentStorage final : public HostService<IPermanentStorage2> {
+public:
+    /// Opens or creates the file, and its directory. Null with `error` set
+    /// when that fails or the file is not one of ours.
+    static std::unique_ptr<PermanentStorage> open(const std::string& path, std::string& error);
+    ~PermanentStorage();
+
+    void* GetInterface(const char* name) override;
+    bool WriteText(const char* section, const char* key, const char* text) override;
+    bool WriteBool(const char* section, const char* key, bool value) override;
+    bool WriteInt(const char* section, const char* key, int32_t value) override;
+    const char* ReadText(const char* section, const char* key) override;
+    bool ReadBool(const char* section, const char* key) override;
+    int32_t ReadInt(const char* section, const char* key) override;
+    bool IsStored(const char* section, const char* key) override;
+    int32_t Reserved11() override { return 0; }
+    int32_t Reserved12() override { return 0; }
+    int32_t Reserved13() override { return 0; }
+    bool ReadTextTo(const char* section, const char* key, char* buffer, int32_t size) override;
+
+private:
+    explicit PermanentStorage(sqlite3* db);
+    /// Settings, table and statements; false with the reason in sqlite3_errmsg.
+    bool prepare();
+    bool writable() const;
+    bool write(const char* section, const char* key, const char* kind, int64_t number,
+               const char* text);
+    /// Reads one value; false when none is stored (or on a database error).
+    bool read(const char* section, const char* key, int64_t* number, std::string* text);
+
+    std::mutex mutex_;
+    sqlite3* db_;
+    sqlite3_stmt* upsert_ = nullptr;
+    sqlite3_stmt* select_ = nullptr;
+};
+
+}  // namespace xtok::host

@@ -1,0 +1,139 @@
+// The permanent storage on a real SQLite file in a fresh directory.
+#include "host/permanent_storage.h"
+
+#include <gtest/gtest.h>
+
+#include <climits>
+#include <cstdlib>
+#include <fstream>
+#include <string>
+#include <thread>
+
+#include "tests/host/temp_dir.h"
+
+namespace xtok::host {
+namespace {
+
+class Storage : public ::testing::Test {
+protected:
+    std::unique_ptr<PermanentStorage> open() {
+        std::string error;
+        auto storage = PermanentStorage::open(path_, error);
+        EXPECT_NE(storage, nullptr) << error;
+        return storage;
+    }
+
+    test::TempDir dir_;
+    std::string path_ = dir_.file("state/xtokline/retained.sqlite3");
+};
+
+TEST_F(Storage, KeepsEachTypeAcrossReopening) {
+    const std::string longText(10000, 'x');
+    {
+        auto storage = open();
+        ASSERT_NE(storage, nullptr);
+        EXPECT_TRUE(storage->WriteInt("XTOK", "baud", 19200));
+        EXPECT_TRUE(storage->WriteInt("XTOK", "min", INT32_MIN));
+        EXPECT_TRUE(storage->WriteBool("XTOK", "on", true));
+        EXPECT_TRUE(storage->WriteBool("XTOK", "off", false));
+        EXPECT_TRUE(storage->WriteText("XTOK", "prefix", "02"));
+        EXPECT_TRUE(storage->WriteText("XTOK", "empty", ""));
+        EXPECT_TRUE(storage->WriteText("XTOK", "long", longText.c_str()));
+        EXPECT_TRUE(storage->WriteText("other", "prefix", "ÄÖ\xff"));
+        EXPECT_TRUE(storage->WriteInt("XTOK", "baud", 9600));  // last write wins
+    }
+    auto storage = open();
+    ASSERT_NE(storage, nullptr);
+    EXPECT_EQ(storage->ReadInt("XTOK", "baud"), 9600);
+    EXPECT_EQ(storage->ReadInt("XTOK", "min"), INT32_MIN);
+    EXPECT_TRUE(storage->ReadBool("XTOK", "on"));
+    EXPECT_FALSE(storage->ReadBool("XTOK", "off"));
+    EXPECT_STREQ(storage->ReadText("XTOK", "prefix"), "02");
+    EXPECT_STREQ(storage->ReadText("XTOK", "empty"), "");
+    EXPECT_EQ(storage->ReadText("XTOK", "long"), longText);
+    EXPECT_STREQ(storage->ReadText("other", "prefix"), "ÄÖ\xff");
+    for (const char* key : {"baud", "min", "on", "off", "prefix", "empty", "long"}) {
+        EXPECT_TRUE(storage->IsStored("XTOK", key)) << key;
+    }
+}
+
+TEST_F(Storage, MissingValuesReadAsZeroAndAreNotStored) {
+    auto storage = open();
+    ASSERT_NE(storage, nullptr);
+    ASSERT_TRUE(storage->WriteInt("XTOK", "baud", 9600));
+    struct Name {
+        const char* section;
+        const char* key;
+    };
+    for (const Name& name : {Name{"XTOK", "bits"}, Name{"xtok", "baud"}, Name{nullptr, "baud"}}) {
+        EXPECT_FALSE(storage->IsStored(name.section, name.key));
+        EXPECT_EQ(storage->ReadInt(name.section, name.key), 0);
+        EXPECT_FALSE(storage->ReadBool(name.section, name.key));
+        EXPECT_STREQ(storage->ReadText(name.section, name.key), "");
+        char buffer[8] = "unset";
+        EXPECT_FALSE(storage->ReadTextTo(name.section, name.key, buffer, sizeof buffer));
+    }
+    EXPECT_FALSE(storage->WriteInt(nullptr, "baud", 1));
+    EXPECT_FALSE(storage->WriteText("XTOK", "text", nullptr));
+}
+
+TEST_F(Storage, ReadTextToNeedsRoomForTheZero) {
+    auto storage = open();
+    ASSERT_NE(storage, nullptr);
+    ASSERT_TRUE(storage->WriteText("XTOK", "suffix", "0D0A"));
+    IPermanentStorage2* extended =
+        static_cast<IPermanentStorage2*>(storage->GetInterface("IPermanentStorage2"));
+    ASSERT_EQ(extended, storage.get());
+    EXPECT_EQ(storage->GetInterface("IPermanentStorage"), static_cast<void*>(storage.get()));
+    EXPECT_EQ(storage->GetInterface("IPermanentStorage3"), nullptr);
+
+    char buffer[8] = "#######";
+    EXPECT_TRUE(extended->ReadTextTo("XTOK", "suffix", buffer, 5));
+    EXPECT_STREQ(buffer, "0D0A");
+    EXPECT_FALSE(extended->ReadTextTo("XTOK", "suffix", buffer, 4));
+    EXPECT_FALSE(extended->ReadTextTo("XTOK", "suffix", buffer, 0));
+    EXPECT_FALSE(extended->ReadTextTo("XTOK", "suffix", nullptr, 8));
+}
+
+TEST_F(Storage, ReadTextIsEachThreadsOwn) {
+    auto storage = open();
+    ASSERT_NE(storage, nullptr);
+    ASSERT_TRUE(storage->WriteText("XTOK", "a", "first"));
+    ASSERT_TRUE(storage->WriteText("XTOK", "b", "second"));
+    const char* mine = storage->ReadText("XTOK", "a");
+    std::thread([&] { EXPECT_STREQ(storage->ReadText("XTOK", "b"), "second"); }).join();
+    EXPECT_STREQ(mine, "first");
+}
+
+TEST(StorageFile, UnusableFilesAreRefusedWithTheReason) {
+    test::TempDir dir;
+    std::ofstream(dir.file("garbage")) << std::string(4096, 'g');
+    std::ofstream(dir.file("file")) << "x";
+    const std::pair<std::string, std::string> cases[] = {
+        {dir.file("garbage"), "not a database"},
+        {dir.file(""), "cannot use"},
+        {dir.file("file/retained.sqlite3"), "cannot create directory"},
+        {"", "no file"},
+    };
+    for (const auto& [path, reason] : cases) {
+        std::string error;
+        EXPECT_EQ(PermanentStorage::open(path, error), nullptr) << path;
+        EXPECT_NE(error.find(reason), std::string::npos) << path << ": " << error;
+    }
+}
+
+TEST(StorageFile, DefaultPathFollowsTheUsersStateDirectory) {
+    std::string home = std::getenv("HOME") ? std::getenv("HOME") : "";
+    setenv("HOME", "/home/op", 1);
+    setenv("XDG_STATE_HOME", "/state", 1);
+    EXPECT_EQ(defaultStoragePath(), "/state/xtokline/retained.sqlite3");
+    setenv("XDG_STATE_HOME", "", 1);
+    EXPECT_EQ(defaultStoragePath(), "/home/op/.local/state/xtokline/retained.sqlite3");
+    unsetenv("XDG_STATE_HOME");
+    unsetenv("HOME");
+    EXPECT_EQ(defaultStoragePath(), "");
+    setenv("HOME", home.c_str(), 1);
+}
+
+}  // namespace
+}  // namespace xtok::host
