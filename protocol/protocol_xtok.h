@@ -102,7 +102,7 @@ private:
     bool consoleSet(const std::string& cmd, const std::string& value, char* reply, int32_t size);
 
     ReceiveTask task_;
-    bool started_ = false;
+    std::atomic<bool> started_{false};  // read by the runtime's threads
     XtokConfig config_;
     std::vector<Model> models_;
     RetainedStore settings_;
