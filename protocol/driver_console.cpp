@@ -65,7 +65,8 @@ bool Protocol_XTOK::driverCommand(const std::vector<std::string>& words, const c
     const std::string& cmd = words[0];
     const bool missing = words.size() < 2;
     if (cmd == "help") {
-        if (FrameworkCommand(line, reply, size) && size > 0) {
+        // Without a buffer there is no framework text to step past.
+        if (FrameworkCommand(line, reply, size) && reply && size > 0) {
             std::size_t used = strnlen(reply, static_cast<std::size_t>(size));
             reply += used;
             size -= static_cast<int32_t>(used);

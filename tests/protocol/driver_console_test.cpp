@@ -202,6 +202,15 @@ TEST_F(DriverConsole, RepliesAreCutAtTheBufferAndThenNotTerminated) {
     EXPECT_EQ(reply, "########");
 }
 
+// A caller that wants no reply passes no buffer; commands still run.
+TEST_F(DriverConsole, NoReplyBuffer) {
+    start("autoConnect=false");
+    for (const char* line : {"help", "get_stat", "connect ON", "put A", "getmaxtm"}) {
+        EXPECT_TRUE(protocol->DoCommand(line, nullptr, 100)) << line;
+    }
+    EXPECT_EQ(host.serial().writes(), std::vector<std::string>{"A"});
+}
+
 TEST_F(DriverConsole, OtherCommandsGoToTheFrameworkConsole) {
     ASSERT_TRUE(configure());
     bool result = false;
