@@ -212,7 +212,7 @@ TEST_F(DriverConsole, NoReplyBuffer) {
 }
 
 TEST_F(DriverConsole, OtherCommandsGoToTheFrameworkConsole) {
-    ASSERT_TRUE(configure());
+    start();
     bool result = false;
     EXPECT_EQ(command("getmaxtm", &result), "maxtm = 0 ms\n");
     EXPECT_TRUE(result);
@@ -221,6 +221,12 @@ TEST_F(DriverConsole, OtherCommandsGoToTheFrameworkConsole) {
     EXPECT_EQ(info.rfind("Protocol: XTOK (471) v.106\nImplementation: Protocol_XTOK v.100\n", 0),
               0u)
         << info;
+    // The framework's tag commands reach the token protocol's memory types.
+    EXPECT_EQ(command("read 0?tokens_available?unsignedInt"), "00000000\n");
+    EXPECT_EQ(command("write 0?SP_Gap?unsignedInt 05000000"), "written ok\n");
+    EXPECT_EQ(readInt("SP_Gap"), 5);
+    EXPECT_EQ(command("write 0?tokens_available?unsignedInt 05000000"),
+              "writing to read_only type");
     // Unknown everywhere: result 0 and the reply untouched.
     for (const char* line : {"Help", "Connect ON", "", " get_stat", "get_stat2"}) {
         EXPECT_EQ(cut(line, 4, &result), "############") << "'" << line << "'";

@@ -50,6 +50,16 @@ TEST_F(Lifecycle, StartOpensThePortAndRunsTheTaskAndStopUndoesBoth) {
     EXPECT_EQ(host.tasks().tasksCreated(), 2);
 }
 
+TEST_F(Lifecycle, DestroyingARunningProtocolEndsItsTaskAndClosesThePort) {
+    start();
+    FakeTask* task = host.tasks().lastTask();
+    rootObject().factory().DestroyProtocol(protocol);
+    protocol = nullptr;
+    EXPECT_TRUE(task->waitEnded(0));
+    EXPECT_FALSE(host.serial().isOpen());
+    EXPECT_EQ(host.tasks().mutexesAlive(), 0);
+}
+
 TEST_F(Lifecycle, StopBeforeStartDoesNothing) {
     ASSERT_TRUE(configure());
     EXPECT_TRUE(protocol->Stop());
@@ -119,45 +129,38 @@ TEST_F(Lifecycle, AStopTheHostTimesOutStillClosesThePort) {
     EXPECT_TRUE(host.tasks().lastTask()->waitEnded(0));
 }
 
-struct LineCase {
-    std::string config;
-    LineSettings line;
-    std::string text;
-};
-
-class LineSettingsAtStart : public ProtocolFixture,
-                            public ::testing::WithParamInterface<LineCase> {};
-
-TEST_P(LineSettingsAtStart, ThePortGetsTheFiveNumbers) {
-    const LineCase& c = GetParam();
-    ASSERT_TRUE(protocol->Configure(c.config.c_str())) << error();
-    ASSERT_TRUE(protocol->Start()) << error();
-    ASSERT_EQ(host.serial().configured().size(), 1u);
-    EXPECT_TRUE(host.serial().configured()[0] == c.line);
-    char text[64] = {};
-    EXPECT_TRUE(protocol->GetSerialSettings(text, sizeof text));
-    EXPECT_EQ(std::string(text), c.text);
+TEST_F(Lifecycle, ThePortIsOpenedWithTheFiveNumbers) {
+    struct Case {
+        std::string keys;
+        LineSettings line;
+        std::string text;
+    };
+    const Case cases[] = {
+        {"port=com1 baudrate=9600 parity=none bits=8 stopbits=1 mode=RS-232",
+         {9600, 0, 8, 1, 0},
+         "com1,9600,none,8,1,RS-232"},
+        {"port=com2 baudrate=19200 parity=even bits=7 stopbits=2 mode=RS-485",
+         {19200, 1, 7, 2, 1},
+         "com2,19200,even,7,2,RS-485"},
+        {"port=com3 baudrate=115200 parity=odd bits=8 stopbits=1 mode=RS-422",
+         {115200, 2, 8, 1, 2},
+         "com3,115200,odd,8,1,RS-422"},
+        {"port=com16 baudrate=150 parity=mark bits=7 stopbits=1 mode=RS-232",
+         {150, 3, 7, 1, 0},
+         "com16,150,mark,7,1,RS-232"},
+    };
+    for (const Case& c : cases) {
+        destroy();
+        create();
+        ASSERT_TRUE(protocol->Configure(("CfgVer=1 model=1 " + c.keys).c_str())) << error();
+        ASSERT_TRUE(protocol->Start()) << error();
+        EXPECT_TRUE(host.serial().configured().back() == c.line) << c.keys;
+        EXPECT_EQ(host.serial().openedNames().back(), c.text.substr(0, c.text.find(',')));
+        char text[64] = {};
+        EXPECT_TRUE(protocol->GetSerialSettings(text, sizeof text));
+        EXPECT_EQ(std::string(text), c.text);
+    }
 }
-
-INSTANTIATE_TEST_SUITE_P(
-    ParityAndModeNames, LineSettingsAtStart,
-    ::testing::Values(
-        LineCase{"CfgVer=1 model=1 port=com1 baudrate=9600 parity=none bits=8 stopbits=1 "
-                 "mode=RS-232",
-                 {9600, 0, 8, 1, 0},
-                 "com1,9600,none,8,1,RS-232"},
-        LineCase{"CfgVer=1 model=1 port=com2 baudrate=19200 parity=even bits=7 stopbits=2 "
-                 "mode=RS-485",
-                 {19200, 1, 7, 2, 1},
-                 "com2,19200,even,7,2,RS-485"},
-        LineCase{"CfgVer=1 model=1 port=com3 baudrate=115200 parity=odd bits=8 stopbits=1 "
-                 "mode=RS-422",
-                 {115200, 2, 8, 1, 2},
-                 "com3,115200,odd,8,1,RS-422"},
-        LineCase{"CfgVer=1 model=1 port=com16 baudrate=150 parity=mark bits=7 stopbits=1 "
-                 "mode=RS-232",
-                 {150, 3, 7, 1, 0},
-                 "com16,150,mark,7,1,RS-232"}));
 
 TEST_F(Lifecycle, ConfigureRefusesUnknownParityAndModeNames) {
     struct Case {
@@ -298,13 +301,18 @@ TEST_F(Lifecycle, CanJoinTags) {
 // Values the operator changed at run time outlive a restart.
 TEST_F(Lifecycle, RetainedValuesWinOverTheConfigurationAtStart) {
     host.storage().put("XTOK", "baud", "19200");
-    host.storage().put("XTOK", "parity", "2");
+    // Codes a configuration cannot give: parity space, mode RS-485P.
+    host.storage().put("XTOK", "parity", "4");
+    host.storage().put("XTOK", "mode", "3");
     host.storage().put("XTOK", "rx_prefix", "02");
     host.storage().put("XTOK", "rx_suffix", "03");
     host.storage().put("XTOK", "hex_tokens", "1");
     start("rx_prefix=AA rx_suffix=BB");
     ASSERT_EQ(host.serial().configured().size(), 1u);
-    EXPECT_TRUE((host.serial().configured()[0] == LineSettings{19200, 2, 8, 1, 0}));
+    EXPECT_TRUE((host.serial().configured()[0] == LineSettings{19200, 4, 8, 1, 3}));
+    char text[64] = {};
+    protocol->GetSerialSettings(text, sizeof text);
+    EXPECT_STREQ(text, "com1,19200,space,8,1,RS-485P");
     EXPECT_EQ(readInt("SP_Baud"), 19200);
     EXPECT_EQ(readText("SP_RxPrefix"), "02");
     play("AA 41 BB 02 41 42 03");

@@ -13,19 +13,11 @@
 namespace xtok::test {
 namespace {
 
-/// `count` copies of the byte `hex` as a script ("41 41 ...").
-std::string times(int count, const std::string& hex) {
+/// `count` copies of `text`.
+std::string times(int count, const std::string& text) {
     std::string out;
     for (int i = 0; i < count; ++i) {
-        out += hex + " ";
-    }
-    return out;
-}
-
-std::string hexTimes(int count, const std::string& hex) {
-    std::string out;
-    for (int i = 0; i < count; ++i) {
-        out += hex;
+        out += text;
     }
     return out;
 }
@@ -61,8 +53,8 @@ INSTANTIATE_TEST_SUITE_P(
         FramingCase{"EachSilenceEndsAToken", "", "41 | 42 43 | |", {"41", "4243"}},
         FramingCase{"SilenceAloneIsNoToken", "", "| |", {}},
         FramingCase{"AnyByteValue", "", "00 0A FF 1F 80", {"000AFF1F80"}},
-        FramingCase{"ThousandBytesAreDelivered", "", times(1000, "41"), {hexTimes(1000, "41")}},
-        FramingCase{"ARunPastAThousandIsDropped", "", times(1001, "41") + "| 42", {"42"}},
+        FramingCase{"ThousandBytesAreDelivered", "", times(1000, "41 "), {times(1000, "41")}},
+        FramingCase{"ARunPastAThousandIsDropped", "", times(1001, "41 ") + "| 42", {"42"}},
         FramingCase{"NoneMeansNoFraming", "rx_prefix=none rx_suffix=none", "02 41 03", {"024103"}}),
     caseName);
 
@@ -94,11 +86,11 @@ INSTANTIATE_TEST_SUITE_P(
         FramingCase{"ARestartCanBeginTheNextMatch", "rx_prefix=0102", "01 01 02 41", {"41"}},
         FramingCase{"AFrameOfAThousandBytesIsDelivered",
                     "rx_prefix=02",
-                    "02 " + times(999, "41"),
-                    {hexTimes(999, "41")}},
+                    "02 " + times(999, "41 "),
+                    {times(999, "41")}},
         FramingCase{"AFramePastAThousandIsDroppedAndHuntingRestarts",
                     "rx_prefix=02",
-                    "02 " + times(1000, "41") + "41 02 42",
+                    "02 " + times(1000, "41 ") + "41 02 42",
                     {"42"}}),
     caseName);
 
@@ -112,10 +104,12 @@ INSTANTIATE_TEST_SUITE_P(
         FramingCase{"HighSuffixByte", "rx_suffix=8A", "41 8A", {"41"}},
         FramingCase{"AFrameEndingAtByteThousandOneIsDelivered",
                     "rx_suffix=03",
-                    times(1000, "41") + "03",
-                    {hexTimes(1000, "41")}},
-        FramingCase{
-            "AFramePastAThousandIsDropped", "rx_suffix=03", times(1001, "41") + "| 42 03", {"42"}}),
+                    times(1000, "41 ") + "03",
+                    {times(1000, "41")}},
+        FramingCase{"AFramePastAThousandIsDropped",
+                    "rx_suffix=03",
+                    times(1001, "41 ") + "| 42 03",
+                    {"42"}}),
     caseName);
 
 INSTANTIATE_TEST_SUITE_P(
@@ -149,11 +143,11 @@ INSTANTIATE_TEST_SUITE_P(
         // The size limit counts prefix and suffix and is checked after the suffix.
         FramingCase{"AFrameOfAThousandAndOneBytesIsDelivered",
                     "rx_prefix=02 rx_suffix=03",
-                    "02 " + times(999, "41") + "03",
-                    {hexTimes(999, "41")}},
+                    "02 " + times(999, "41 ") + "03",
+                    {times(999, "41")}},
         FramingCase{"AFramePastAThousandIsDroppedAndHuntingRestarts",
                     "rx_prefix=02 rx_suffix=03",
-                    "02 " + times(1000, "41") + "03 02 42 03",
+                    "02 " + times(1000, "41 ") + "03 02 42 03",
                     {"42"}}),
     caseName);
 
@@ -198,96 +192,62 @@ TEST_F(ReceiveConnection, NothingIsReadWhileDisconnectedAndReadingGoesOnAfterCon
     EXPECT_EQ(takeTokens(), std::vector<std::string>{"AB"});
 }
 
-/// A serial line whose read, once nothing is queued, is held until the test
-/// lets it go with a byte or a time-out; so a test can act while the receive
-/// task waits inside a read.
-class HeldSerial final : public FakeService<ISerialFactory> {
+/// A line that delivers `bytes`, then holds the next read until release():
+/// with a byte, or as a time-out. Later reads time out. A test can so act
+/// while the receive task waits inside a read, holding the port's lock.
+class HeldLine final : public FakeService<ISerialFactory>, public ISerialPort {
 public:
-    HeldSerial() : FakeService("ISerialFactory", 300), port_(*this) {}
+    explicit HeldLine(std::string bytes)
+        : FakeService("ISerialFactory", 300), bytes_(std::move(bytes)) {}
 
-    ISerialPort* Open(const char*) override { return &port_; }
+    ISerialPort* Open(const char*) override { return this; }
     void Close(ISerialPort*) override {}
+    void* Destroy(unsigned) override { return this; }
+    int32_t Reserved1() override { return 0; }
+    int32_t Reserved2() override { return 0; }
+    int32_t Reserved3() override { return 0; }
+    bool Configure(int32_t, int32_t, int32_t, int32_t, int32_t) override { return true; }
+    int32_t Reserved5() override { return 0; }
+    bool Write(const uint8_t*, int32_t, int32_t) override { return true; }
 
-    void feed(const std::string& bytes) {
-        std::lock_guard<std::mutex> lock(mutex_);
-        queued_.insert(queued_.end(), bytes.begin(), bytes.end());
+    bool ReadByte(uint8_t* destination, int32_t, int32_t) override {
+        std::unique_lock<std::mutex> lock(mutex_);
+        if (next_ < bytes_.size()) {
+            *destination = static_cast<uint8_t>(bytes_[next_++]);
+            return true;
+        }
+        if (held_ || released_) {
+            changed_.wait_for(lock, std::chrono::milliseconds(1));
+            return false;
+        }
+        held_ = true;
         changed_.notify_all();
+        changed_.wait(lock, [this] { return released_; });
+        if (!with_) {
+            return false;
+        }
+        *destination = *with_;
+        return true;
     }
-    /// Waits until everything fed has been read and a read is held.
+
     bool waitHeld() {
         std::unique_lock<std::mutex> lock(mutex_);
-        return changed_.wait_for(lock, std::chrono::seconds(5),
-                                 [this] { return held_ && queued_.empty(); });
+        return changed_.wait_for(lock, std::chrono::seconds(5), [this] { return held_; });
     }
-    /// Ends the held read with `byte`, or with a time-out when there is none.
     void release(std::optional<uint8_t> byte) {
         std::lock_guard<std::mutex> lock(mutex_);
-        releaseWith_ = byte;
+        with_ = byte;
         released_ = true;
-        changed_.notify_all();
-    }
-    /// From now on reads answer a time-out at once.
-    void open() {
-        std::lock_guard<std::mutex> lock(mutex_);
-        open_ = true;
         changed_.notify_all();
     }
 
 private:
-    class Port final : public ISerialPort {
-    public:
-        explicit Port(HeldSerial& owner) : owner_(owner) {}
-        void* Destroy(unsigned) override { return this; }
-        int32_t Reserved1() override { return 0; }
-        int32_t Reserved2() override { return 0; }
-        int32_t Reserved3() override { return 0; }
-        bool Configure(int32_t, int32_t, int32_t, int32_t, int32_t) override { return true; }
-        int32_t Reserved5() override { return 0; }
-        bool ReadByte(uint8_t* destination, int32_t, int32_t) override {
-            return owner_.read(destination);
-        }
-        bool Write(const uint8_t*, int32_t, int32_t) override { return true; }
-
-    private:
-        HeldSerial& owner_;
-    };
-
-    bool read(uint8_t* destination) {
-        std::unique_lock<std::mutex> lock(mutex_);
-        if (queued_.empty() && open_) {
-            changed_.wait_for(lock, std::chrono::milliseconds(1));
-            return false;
-        }
-        if (queued_.empty()) {
-            held_ = true;
-            changed_.notify_all();
-            changed_.wait(lock, [this] { return released_ || open_ || !queued_.empty(); });
-            held_ = false;
-        }
-        if (released_) {
-            released_ = false;
-            std::optional<uint8_t> with = releaseWith_;
-            releaseWith_.reset();
-            if (!with) {
-                return false;
-            }
-            *destination = *with;
-            return true;
-        }
-        if (queued_.empty()) {
-            return false;
-        }
-        *destination = static_cast<uint8_t>(queued_.front());
-        queued_.erase(queued_.begin());
-        return true;
-    }
-
-    Port port_;
+    std::string bytes_;
+    std::size_t next_ = 0;
     std::mutex mutex_;
     std::condition_variable changed_;
-    std::string queued_;
-    bool held_ = false, released_ = false, open_ = false;
-    std::optional<uint8_t> releaseWith_;
+    bool held_ = false, released_ = false;
+    std::optional<uint8_t> with_;
 };
 
 struct HeldCase {
@@ -308,7 +268,7 @@ protected:
         host.provide("ISerialFactory", static_cast<ISerialFactory*>(&line));
     }
     void TearDown() override {
-        line.open();
+        line.release(std::nullopt);  // lets Stop end the task on a failed test too
         ProtocolFixture::TearDown();
     }
     int idleSleeps() {
@@ -316,7 +276,7 @@ protected:
         return static_cast<int>(std::count(s.begin(), s.end(), 10));
     }
 
-    HeldSerial line;
+    HeldLine line{"AB"};
 };
 
 // No framing: a gap would deliver the bytes collected so far; a disconnect
@@ -324,7 +284,6 @@ protected:
 TEST_P(DisconnectDuringRead, EndsThePassAtTheNextByte) {
     const HeldCase& c = GetParam();
     start();
-    line.feed("AB");
     ASSERT_TRUE(line.waitHeld());  // A and B collected, waiting for more
     int idle = idleSleeps();
     std::string reply;
