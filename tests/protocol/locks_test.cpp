@@ -203,9 +203,12 @@ int tokenNumber(const std::string& token) {
 
 class LockStress : public ProtocolFixture {
 protected:
-    void SetUp() override {
-        ProtocolFixture::SetUp();
-        ASSERT_TRUE(configure("rx_prefix=02 rx_suffix=03 token_queue_size=" + queueSize()));
+    /// A fresh protocol with prefix 02, suffix 03 and this queue size.
+    void begin(int queueSize) {
+        destroy();
+        create();
+        ASSERT_TRUE(
+            configure("rx_prefix=02 rx_suffix=03 token_queue_size=" + std::to_string(queueSize)));
         ASSERT_TRUE(protocol->Start());
         // Tags are made here: only reads and writes are concurrent.
         rxToken = tag(textUri("rx_token", 16));
@@ -216,7 +219,6 @@ protected:
         gap = tag(intUri("SP_Gap"));
         host.tasks().clearLockEvents();
     }
-    virtual std::string queueSize() const { return "10000"; }
 
     std::string readToken() {
         char value[17] = {};
@@ -259,58 +261,63 @@ protected:
          *connect = nullptr, *gap = nullptr;
 };
 
-// Readers only look, one consumer acknowledges: every token arrives once, in order.
-TEST_F(LockStress, NoTokenIsLostWhileReadersAndAConsumerRun) {
+// Readers only look, one consumer reads and acknowledges. With room for all
+// every token arrives once, in order; with a small queue only the oldest are
+// dropped, so what arrives is in order and ends with the last token.
+TEST_F(LockStress, NoTokenIsLostBeyondDroppingTheOldest) {
     Watchdog watchdog(20);
     const int count = 2000;
-    std::atomic<bool> stop{false};
-    std::atomic<int> malformed{0};
-    std::vector<std::thread> readers;
-    for (int r = 0; r < 2; ++r) {
-        readers.emplace_back([&] {
-            while (!stop) {
-                std::string token = readToken();
-                if (!token.empty() && tokenNumber(token) < 0) {
-                    ++malformed;
+    for (int queueSize : {10000, 4}) {
+        SCOPED_TRACE("queue size " + std::to_string(queueSize));
+        begin(queueSize);
+        std::atomic<bool> stop{false};
+        std::atomic<int> malformed{0};
+        std::vector<std::thread> readers;
+        for (int r = 0; r < 2; ++r) {
+            readers.emplace_back([&] {
+                while (!stop) {
+                    std::string token = readToken();
+                    if ((!token.empty() && tokenNumber(token) < 0) || readAvailable() < 0) {
+                        ++malformed;
+                    }
+                    std::this_thread::yield();
                 }
-                if (readAvailable() < 0) {
-                    ++malformed;
-                }
-                std::this_thread::yield();
-            }
-        });
+            });
+        }
+        std::vector<int> seen;
+        std::thread consumer([&] { seen = consume(count - 1, stop); });
+        host.serial().feed(framedTokens(0, count));
+        std::set<std::thread::id> known = {consumer.get_id()};
+        for (auto& t : readers) {
+            known.insert(t.get_id());
+        }
+        consumer.join();
+        stop = true;
+        for (auto& t : readers) {
+            t.join();
+        }
+        EXPECT_EQ(malformed, 0);
+        ASSERT_FALSE(seen.empty());
+        EXPECT_EQ(seen.back(), count - 1);
+        if (queueSize >= count) {
+            ASSERT_EQ(seen.size(), static_cast<std::size_t>(count));
+        }
+        // In order and ending with the last: with all of them, exactly 0 to count - 1.
+        EXPECT_GE(seen.front(), 0);
+        for (std::size_t i = 1; i < seen.size(); ++i) {
+            ASSERT_GT(seen[i], seen[i - 1]) << i;
+        }
+        checkLockOrder(known);
     }
-    std::vector<int> seen;
-    std::thread consumer([&] { seen = consume(count - 1, stop); });
-    host.serial().feed(framedTokens(0, count));
-    std::set<std::thread::id> known = {consumer.get_id()};
-    for (auto& t : readers) {
-        known.insert(t.get_id());
-    }
-    consumer.join();
-    stop = true;
-    for (auto& t : readers) {
-        t.join();
-    }
-    EXPECT_EQ(malformed, 0);
-    ASSERT_EQ(seen.size(), static_cast<std::size_t>(count));
-    for (int i = 0; i < count; ++i) {
-        ASSERT_EQ(seen[static_cast<std::size_t>(i)], i);
-    }
-    checkLockOrder(known);
 }
-
-class LockStressSmallQueue : public LockStress {
-protected:
-    std::string queueSize() const override { return "4"; }
-};
 
 // Everything at once: the consumer, SP_Done clearing the queue, connect
 // toggled by tag and settings staged. Nothing may deadlock, the lock order
 // must hold, and what is read stays well-formed and in order.
-TEST_F(LockStressSmallQueue, EverythingAtOnce) {
+TEST_F(LockStress, EverythingAtOnce) {
     Watchdog watchdog(20);
-    const int count = 3000;
+    begin(4);
+    const int count = 2000;
     std::atomic<bool> stop{false};
     std::atomic<int> bad{0};
     std::vector<std::thread> workers;
@@ -324,6 +331,7 @@ TEST_F(LockStressSmallQueue, EverythingAtOnce) {
             if (!token.empty() && tokenNumber(token) < 0) {
                 ++bad;
             }
+            std::this_thread::yield();
         }
     });
     workers.emplace_back([&] {  // applies settings
@@ -339,7 +347,7 @@ TEST_F(LockStressSmallQueue, EverythingAtOnce) {
     });
     std::atomic<int> toggles{0};
     workers.emplace_back([&] {  // the only one that changes the connection
-        for (int i = 0; i < 200 && !stop; ++i) {
+        for (int i = 0; i < 100 && !stop; ++i) {
             if (!write(connect, 0) || !write(connect, 1)) {
                 ++bad;
             }
@@ -351,7 +359,7 @@ TEST_F(LockStressSmallQueue, EverythingAtOnce) {
     // Runs until the stop below: tokens that SP_Done cleared never come.
     std::thread consumer([&] { seen = consume(-2, stop); });
     host.serial().feed(framedTokens(0, count));
-    EXPECT_TRUE(eventually([&] { return toggles >= 200; }, 15000));
+    EXPECT_TRUE(eventually([&] { return toggles >= 100; }, 15000));
     EXPECT_TRUE(host.serial().waitDrained(15000));
     stop = true;
     std::set<std::thread::id> known = {consumer.get_id()};
@@ -373,7 +381,7 @@ TEST_F(LockStressSmallQueue, EverythingAtOnce) {
     ASSERT_TRUE(write(ack, 1) && write(done, 1));
     host.serial().feed(framedTokens(count, 1));
     ASSERT_TRUE(host.serial().waitDrained());
-    EXPECT_EQ(readToken(), "T03000");
+    EXPECT_EQ(readToken(), "T02000");
 }
 
 }  // namespace
