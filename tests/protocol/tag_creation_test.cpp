@@ -15,6 +15,10 @@ struct UriCase {
     int32_t node = 0;
 };
 
+void PrintTo(const UriCase& c, std::ostream* os) {
+    *os << c.uri;
+}
+
 class TagCreation : public ProtocolFixture, public ::testing::WithParamInterface<UriCase> {};
 
 TEST_P(TagCreation, MadeOrRefusedWithItsReason) {
@@ -59,7 +63,7 @@ INSTANTIATE_TEST_SUITE_P(
                       // Node numbers read as C literals; unknown nodes use the default record.
                       UriCase{"0x10?connect?boolean", "", 16},
                       UriCase{"010?connect?boolean", "", 8}, UriCase{"4?connect?boolean", "", 4},
-                      UriCase{"42?tx_token?byte-8", "", 42},
+                      UriCase{"42?tx_token?string-8", "", 42},
                       UriCase{"0?SP_Par?unsignedByte", "", 0},
                       UriCase{"0?SP_Baud?unsignedInt", "", 0},
                       UriCase{"0?token_ack?boolean", "", 0}));
