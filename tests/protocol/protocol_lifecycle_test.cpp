@@ -327,7 +327,13 @@ TEST_F(Lifecycle, RetainedValuesLiveUnderTheInstanceName) {
     EXPECT_TRUE((host.serial().configured()[0] == LineSettings{38400, 1, 8, 1, 0}));
     for (const std::string& c : host.storage().calls()) {
         EXPECT_EQ(c.find(" XTOK "), std::string::npos) << c;
+        EXPECT_NE(c.rfind("Write", 0), 0u) << "Start only reads: " << c;
     }
+    // Read once per protocol: a later Start keeps what the first one read.
+    host.storage().put("Line2", "baud", "57600");
+    ASSERT_TRUE(protocol->Stop());
+    ASSERT_TRUE(protocol->Start());
+    EXPECT_TRUE((host.serial().configured().back() == LineSettings{38400, 1, 8, 1, 0}));
 }
 
 }  // namespace
