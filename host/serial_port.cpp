@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <libserialport.h>
 #include <poll.h>
+#include <sys/file.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -80,6 +81,13 @@ std::unique_ptr<SerialPort> SerialPort::open(const std::string& device, SerialFa
     }
     // Adopted at once so that every failure below closes what was opened.
     std::unique_ptr<SerialPort> opened(new SerialPort(device, factory, port, fd));
+    // Two programs on one line garble each other's frames; the advisory lock
+    // is what terminal programs check, and it says "busy" where the kernel
+    // would let the second open pass.
+    if (::flock(fd, LOCK_EX | LOCK_NB) != 0) {
+        error = errno == EWOULDBLOCK ? "in use by another program" : std::strerror(errno);
+        return nullptr;
+    }
     int flags = fcntl(fd, F_GETFL);
     if (flags < 0 || fcntl(fd, F_SETFL, flags | O_NONBLOCK) != 0) {
         error = std::strerror(errno);

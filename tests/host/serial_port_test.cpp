@@ -175,7 +175,17 @@ TEST_F(Pty, Rs485WithoutDriverSupportWorksAndIsSaidOncePerDevice) {
     EXPECT_EQ(notices_.count("RS-485"), 1);
 }
 
+TEST_F(Pty, SecondOpenOfALineIsRefusedAsBusyUntilTheFirstCloses) {
+    EXPECT_EQ(factory_.Open(slave_.c_str()), nullptr);
+    EXPECT_EQ(notices_.count("in use by another program"), 1);
+    factory_.Close(port_);
+    port_ = factory_.Open(slave_.c_str());
+    EXPECT_NE(port_, nullptr);
+}
+
 TEST_F(Pty, OpensByAnAssignedComName) {
+    factory_.Close(port_);  // the line is taken while the fixture holds it
+    port_ = nullptr;
     ComMap ports;
     std::string error;
     ASSERT_TRUE(ports.assign("com4=" + slave_, error));

@@ -1,0 +1,329 @@
+#include "tools/console_session.h"
+
+#include <cstdlib>
+#include <ostream>
+
+#include "tools/interrupt.h"
+#include "tools/json_line.h"
+#include "tools/token_view.h"
+
+namespace xtok::tools {
+
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+// How often "watch" asks the queue: well below what a person notices.
+constexpr std::chrono::milliseconds kWatchPoll{10};
+
+const char* const kHostHelp =
+    "Commands of xtok-host (typed values):\n"
+    "  tag read ADDRESS           read a tag, e.g. tag read 0?tokens_available?unsignedInt\n"
+    "  tag write ADDRESS VALUE    write a tag, e.g. tag write 0?tx_token?string-64 HELLO\n"
+    "                             or tag write 0?SP_Baud?unsignedInt 19200\n"
+    "  watch [--count N] [--timeout SECONDS]\n"
+    "                             show received tokens (time, text, hex) and acknowledge\n"
+    "                             them, until Ctrl-C, N tokens or the time-out\n"
+    "  settings                   the line settings: active, and the SP_ values\n"
+    "  help                       this text and the plug-in's console commands\n"
+    "  quit                       leave (also exit, or the end of input)\n"
+    "Values: numbers in decimal or 0x hex; booleans 0/1, true/false, on/off;\n"
+    "strings as the rest of the line (\"quotes\" keep outer blanks) with the escapes\n"
+    "\\xHH \\n \\r \\t \\\\; arrays as numbers separated by blanks or commas; binary as hex.\n"
+    "Any other line goes to the plug-in's console, whose read and write take\n"
+    "raw hex data:\n";
+
+// The settings tags in the order a person reads a line setup. Strings are
+// sized for any prefix an operator would configure.
+struct SettingTag {
+    const char* name;
+    const char* address;
+};
+const SettingTag kSettings[] = {
+    {"SP_Baud", "0?SP_Baud?unsignedInt"},
+    {"SP_Par", "0?SP_Par?unsignedByte"},
+    {"SP_Bits", "0?SP_Bits?unsignedByte"},
+    {"SP_Stop", "0?SP_Stop?unsignedByte"},
+    {"SP_Mode", "0?SP_Mode?unsignedByte"},
+    {"SP_RxPrefix", "0?SP_RxPrefix?string-256"},
+    {"SP_RxSuffix", "0?SP_RxSuffix?string-256"},
+    {"SP_TxPrefix", "0?SP_TxPrefix?string-256"},
+    {"SP_TxSuffix", "0?SP_TxSuffix?string-256"},
+    {"SP_Gap", "0?SP_Gap?unsignedInt"},
+    {"SP_HexTokens", "0?SP_HexTokens?boolean"},
+    {"SP_TokenQueueSize", "0?SP_TokenQueueSize?unsignedInt"},
+};
+
+std::vector<std::string> splitWords(const std::string& line) {
+    std::vector<std::string> words;
+    std::size_t at = 0;
+    while ((at = line.find_first_not_of(" \t", at)) != std::string::npos) {
+        std::size_t end = line.find_first_of(" \t", at);
+        words.push_back(line.substr(at, end - at));
+        at = end;
+    }
+    return words;
+}
+
+std::string trimmed(const std::string& text) {
+    std::size_t first = text.find_first_not_of(" \t\r\n");
+    if (first == std::string::npos) {
+        return "";
+    }
+    return text.substr(first, text.find_last_not_of(" \t\r\n") - first + 1);
+}
+
+/// What follows the first `skip` words of `line`, as typed.
+std::string restAfterWords(const std::string& line, int skip) {
+    std::size_t at = 0;
+    for (int i = 0; i < skip; ++i) {
+        at = line.find_first_not_of(" \t", at);
+        at = at == std::string::npos ? at : line.find_first_of(" \t", at);
+        if (at == std::string::npos) {
+            return "";
+        }
+    }
+    std::size_t start = line.find_first_not_of(" \t", at);
+    if (start == std::string::npos) {
+        return "";
+    }
+    std::string rest = line.substr(start);
+    if (rest.size() >= 2 && rest.front() == '"' && rest.back() == '"') {
+        return rest.substr(1, rest.size() - 2);
+    }
+    return rest;
+}
+
+/// The name of a parity or mode code, as the configuration writes them.
+std::string codeName(const std::string& tag, unsigned code) {
+    static const char* const kParity[] = {"none", "even", "odd", "mark", "space"};
+    static const char* const kMode[] = {"RS-232", "RS-485", "RS-422", "RS-485P"};
+    if (tag == "SP_Par" && code < 5) {
+        return kParity[code];
+    }
+    if (tag == "SP_Mode" && code < 4) {
+        return kMode[code];
+    }
+    return "";
+}
+
+bool parseCount(const std::string& text, long& number) {
+    char* end = nullptr;
+    number = std::strtol(text.c_str(), &end, 10);
+    return !text.empty() && *end == '\0' && number > 0;
+}
+
+bool parseSeconds(const std::string& text, double& seconds) {
+    char* end = nullptr;
+    seconds = std::strtod(text.c_str(), &end);
+    return !text.empty() && *end == '\0' && seconds > 0 && seconds < 1e7;
+}
+
+}  // namespace
+
+ConsoleSession::ConsoleSession(PluginSession& session, bool json, std::ostream& out,
+                               std::ostream& err)
+    : session_(session), json_(json), out_(out), err_(err) {}
+
+bool ConsoleSession::run(LineInput& input) {
+    bool allGood = true;
+    std::string line;
+    while (!quit_ && input.next(line)) {
+        allGood = execute(line) && allGood;
+        out_.flush();
+    }
+    return allGood;
+}
+
+bool ConsoleSession::execute(const std::string& raw) {
+    std::string line = trimmed(raw);
+    if (line.empty() || line[0] == '#') {
+        return true;
+    }
+    std::vector<std::string> words = splitWords(line);
+    const std::string& word = words[0];
+    if (word == "quit" || word == "exit") {
+        quit_ = true;
+        return true;
+    }
+    if (word == "help") {
+        return help(line);
+    }
+    if (word == "tag") {
+        return tag(line, words);
+    }
+    if (word == "watch") {
+        return watch(line, words);
+    }
+    if (word == "settings") {
+        return settings(line);
+    }
+    return passOn(line);
+}
+
+bool ConsoleSession::fail(const std::string& line, const std::string& error) {
+    if (json_) {
+        out_ << JsonLine().text("command", line).flag("ok", false).text("error", error).str()
+             << '\n';
+    } else {
+        err_ << "error: " << error << '\n';
+    }
+    return false;
+}
+
+void ConsoleSession::report(const std::string& json, const std::string& text) {
+    if (json_) {
+        out_ << json << '\n';
+    } else if (!text.empty()) {
+        out_ << text << (text.back() == '\n' ? "" : "\n");
+    }
+}
+
+bool ConsoleSession::help(const std::string& line) {
+    bool ok = false;
+    std::string plugin = session_.command("help", ok);
+    std::string text = kHostHelp + plugin;
+    report(JsonLine().text("command", line).flag("ok", true).text("help", text).str(), text);
+    return true;
+}
+
+bool ConsoleSession::tag(const std::string& line, const std::vector<std::string>& words) {
+    if (words.size() >= 3 && words[1] == "read") {
+        if (words.size() > 3) {
+            return fail(line, "tag read takes one address, e.g. tag read 0?connect?boolean");
+        }
+        return tagRead(line, words[2]);
+    }
+    if (words.size() >= 3 && words[1] == "write") {
+        if (words.size() == 3) {
+            return fail(line, "tag write needs a value after the address");
+        }
+        return tagWrite(line, words[2], restAfterWords(line, 3));
+    }
+    return fail(line, "use tag read ADDRESS or tag write ADDRESS VALUE");
+}
+
+bool ConsoleSession::tagRead(const std::string& line, const std::string& address) {
+    TagValue value;
+    std::string error;
+    if (!session_.read(address, value, error)) {
+        return fail(line, error);
+    }
+    report(JsonLine()
+               .text("command", line)
+               .flag("ok", true)
+               .text("address", address)
+               .raw("value", formatValueJson(value.shape, value.bytes))
+               .str(),
+           formatValue(value.shape, value.bytes));
+    return true;
+}
+
+bool ConsoleSession::tagWrite(const std::string& line, const std::string& address,
+                              const std::string& value) {
+    std::string error;
+    if (!session_.write(address, value, error)) {
+        return fail(line, error);
+    }
+    report(JsonLine().text("command", line).flag("ok", true).text("address", address).str(), "ok");
+    return true;
+}
+
+bool ConsoleSession::watch(const std::string& line, const std::vector<std::string>& words) {
+    long count = 0;
+    double seconds = 0;
+    std::string secondsText;
+    for (std::size_t i = 1; i < words.size(); i += 2) {
+        bool hasValue = i + 1 < words.size();
+        if (words[i] == "--count" && hasValue && parseCount(words[i + 1], count)) {
+            continue;
+        }
+        if (words[i] == "--timeout" && hasValue && parseSeconds(words[i + 1], seconds)) {
+            secondsText = words[i + 1];
+            continue;
+        }
+        return fail(line, "use watch [--count N] [--timeout SECONDS] with N and SECONDS above 0");
+    }
+    bool timed = seconds > 0;
+    Clock::time_point deadline =
+        Clock::now() + std::chrono::milliseconds(static_cast<int64_t>(seconds * 1000));
+    long seen = 0;
+    while ((count == 0 || seen < count) && (!timed || Clock::now() < deadline)) {
+        Token token;
+        std::string error;
+        Intake intake = session_.takeToken(token, error);
+        if (intake == Intake::Failed) {
+            return fail(line, error);
+        }
+        if (intake == Intake::Token) {
+            ++seen;
+            report(JsonLine()
+                       .text("command", line)
+                       .text("time", isoTime(token.arrived))
+                       .text("token", token.text)
+                       .number("length", token.length)
+                       .str(),
+                   clockText(token.arrived) + "  " + tokenLine(token));
+            out_.flush();
+        } else if (pauseUnlessInterrupted(kWatchPoll)) {
+            break;
+        }
+    }
+    takeInterrupt();  // Ctrl-C ended the watch, not the session
+    if (count > 0 && seen < count && timed && Clock::now() >= deadline) {
+        return fail(line, std::to_string(seen) + " of " + std::to_string(count) +
+                              " tokens arrived within " + secondsText + " s");
+    }
+    if (json_) {
+        out_ << JsonLine().text("command", line).flag("ok", true).number("tokens", seen).str()
+             << '\n';
+    }
+    return true;
+}
+
+bool ConsoleSession::settings(const std::string& line) {
+    char active[256] = {};
+    session_.protocol().GetSerialSettings(active, sizeof active - 1);
+    JsonLine json;
+    json.text("command", line).flag("ok", true).text("active", active);
+    std::string text = "active line        " + std::string(active) + "\n";
+    for (const SettingTag& setting : kSettings) {
+        TagValue value;
+        std::string error;
+        if (!session_.read(setting.address, value, error)) {
+            return fail(line, error);
+        }
+        // Prefixes and suffixes are hex texts already: shown as they stand.
+        bool isText = value.shape.code == 10;
+        std::string shown =
+            isText ? stringValue(value.bytes) : formatValue(value.shape, value.bytes);
+        shown = isText && shown.empty() ? "(none)" : shown;
+        std::string name = codeName(setting.name, value.bytes.empty() ? 0 : value.bytes[0]);
+        json.raw(setting.name, formatValueJson(value.shape, value.bytes));
+        text += std::string(setting.name) +
+                std::string(19 - std::string(setting.name).size(), ' ') + shown +
+                (name.empty() ? "" : " (" + name + ")") + "\n";
+    }
+    text += "SP_ values written here wait for SP_Done, which applies and keeps them.\n";
+    report(json.str(), text);
+    return true;
+}
+
+bool ConsoleSession::passOn(const std::string& line) {
+    bool ok = false;
+    std::string reply = session_.command(line, ok);
+    if (!ok) {
+        // The consoles begin their error replies with the word; it is said already.
+        std::string why = trimmed(reply);
+        for (const char* lead : {"ERROR: ", "error: "}) {
+            if (why.rfind(lead, 0) == 0) {
+                why.erase(0, std::string(lead).size());
+            }
+        }
+        return fail(line, line.substr(0, line.find(' ')) + ": " + why);
+    }
+    report(JsonLine().text("command", line).flag("ok", true).text("reply", reply).str(), reply);
+    return true;
+}
+
+}  // namespace xtok::tools

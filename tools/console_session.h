@@ -1,0 +1,45 @@
+// The "run" console: host commands that read and write tags with typed
+// values, watch received tokens and show the line settings; every other
+// line goes to the plug-in's own console.
+#pragma once
+
+#include <iosfwd>
+#include <string>
+#include <vector>
+
+#include "tools/line_input.h"
+#include "tools/plugin_session.h"
+
+namespace xtok::tools {
+
+class ConsoleSession {
+public:
+    /// With `json`, every result is one JSON object on one line of `out`.
+    ConsoleSession(PluginSession& session, bool json, std::ostream& out, std::ostream& err);
+
+    /// Runs lines until the input ends or "quit"; true when none failed.
+    bool run(LineInput& input);
+    /// One line; false when it failed.
+    bool execute(const std::string& line);
+    bool quitRequested() const { return quit_; }
+
+private:
+    bool help(const std::string& line);
+    bool tag(const std::string& line, const std::vector<std::string>& words);
+    bool tagRead(const std::string& line, const std::string& address);
+    bool tagWrite(const std::string& line, const std::string& address, const std::string& value);
+    bool watch(const std::string& line, const std::vector<std::string>& words);
+    bool settings(const std::string& line);
+    bool passOn(const std::string& line);
+
+    bool fail(const std::string& line, const std::string& error);
+    void report(const std::string& json, const std::string& text);
+
+    PluginSession& session_;
+    bool json_;
+    std::ostream& out_;
+    std::ostream& err_;
+    bool quit_ = false;
+};
+
+}  // namespace xtok::tools

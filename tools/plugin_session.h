@@ -1,0 +1,90 @@
+// The plug-in as a panel runs it: host services, the loaded library, one
+// configured and started protocol, and the tags a panel would use.
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "host/plugin_loader.h"
+#include "host/service_provider.h"
+#include "tools/tag_values.h"
+
+namespace xtok::tools {
+
+struct SessionOptions {
+    std::string pluginPath;
+    std::string config;
+    host::ComMap ports;
+    /// Without it the protocol starts from its configuration alone.
+    bool permanentStorage = true;
+    std::string statePath;     // "" for the host's default file
+    std::string instanceName;  // "" for the protocol's own name
+    /// Host notices after a successful start; during it they become part of
+    /// the start error instead.
+    host::Notice notice = host::printNotice;
+};
+
+/// A tag's value as read.
+struct TagValue {
+    TagShape shape;
+    std::vector<uint8_t> bytes;
+};
+
+/// A received token as the panel sees it.
+struct Token {
+    std::string text;  // rx_token: the stored form up to its first zero byte
+    uint32_t length;   // rx_token_len: the stored form's whole length
+    std::chrono::system_clock::time_point arrived;
+};
+
+enum class Intake { None, Token, Failed };
+
+class NoticeRelay;
+
+class PluginSession {
+public:
+    /// Null with one line in `error` when any step fails: the state file, the
+    /// plug-in, the configuration, or the port.
+    static std::unique_ptr<PluginSession> start(const SessionOptions& options, std::string& error);
+    ~PluginSession();
+    PluginSession(const PluginSession&) = delete;
+    PluginSession& operator=(const PluginSession&) = delete;
+
+    IProtocol7& protocol() { return *protocol_; }
+
+    /// A tag by its address, made once and kept. Null with `error` set.
+    ITag* tag(const std::string& address, std::string& error);
+    bool read(const std::string& address, TagValue& value, std::string& error);
+    /// Writes `text`, typed as the address's data type says (tag_values.h).
+    bool write(const std::string& address, const std::string& text, std::string& error);
+
+    /// A line for the plug-in's own console. `ok` is false when the console
+    /// did not know the command or answered an error.
+    std::string command(const std::string& line, bool& ok);
+
+    /// Takes the oldest received token off the queue, if there is one.
+    Intake takeToken(Token& token, std::string& error);
+
+private:
+    PluginSession() = default;
+    bool load(const SessionOptions& options, std::string& error);
+    bool readBytes(ITag& tag, std::vector<uint8_t>& bytes, std::string& error);
+    std::string lastError();
+
+    struct TagDeleter {
+        void operator()(ITag* tag) const;
+    };
+
+    // Declared in the order of building; destroyed the other way round.
+    std::shared_ptr<NoticeRelay> relay_;
+    std::unique_ptr<host::ServiceProvider> host_;
+    std::unique_ptr<host::LoadedPlugin> plugin_;
+    IProtocol7* protocol_ = nullptr;
+    std::map<std::string, std::unique_ptr<ITag, TagDeleter>> tags_;
+};
+
+}  // namespace xtok::tools

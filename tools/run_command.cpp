@@ -1,0 +1,71 @@
+#include "tools/run_command.h"
+
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <fstream>
+#include <ostream>
+#include <sstream>
+
+#include "tools/console_session.h"
+#include "tools/line_input.h"
+#include "tools/plugin_session.h"
+
+namespace xtok::tools {
+
+namespace {
+
+constexpr int kUsageError = 2;
+
+bool configText(const std::string& option, std::string& text, std::string& error) {
+    if (option.empty() || option[0] != '@') {
+        text = option;
+        return true;
+    }
+    std::string path = option.substr(1);
+    std::ifstream file(path, std::ios::binary);
+    std::ostringstream content;
+    if (!file || !(content << file.rdbuf())) {
+        error = "cannot read the configuration file " + path + ": " + std::strerror(errno);
+        return false;
+    }
+    text = content.str();
+    return true;
+}
+
+}  // namespace
+
+int runConsole(const RunOptions& options, std::ostream& out, std::ostream& err) {
+    SessionOptions session;
+    std::string error;
+    session.pluginPath = options.pluginPath;
+    session.statePath = options.statePath;
+    session.instanceName = options.instanceName;
+    bool usable = configText(options.config, session.config, error);
+    for (const std::string& map : options.maps) {
+        usable = usable && session.ports.assign(map, error);
+    }
+    if (!usable) {
+        err << "xtok-host: " << error << std::endl;
+        return kUsageError;
+    }
+    std::unique_ptr<PluginSession> started = PluginSession::start(session, error);
+    if (!started) {
+        err << "xtok-host: " << error << std::endl;
+        return 1;
+    }
+    bool typed = options.exec.empty() && isatty(STDIN_FILENO);
+    std::unique_ptr<LineInput> input =
+        options.exec.empty() ? LineInput::fromStdin("xtok> ") : LineInput::fromText(options.exec);
+    if (typed && !options.json) {
+        char line[256] = {};
+        started->protocol().GetSerialSettings(line, sizeof line - 1);
+        out << "xtok-host: " << started->protocol().GetDisplayName() << " on " << line
+            << "; help lists the commands, quit leaves" << std::endl;
+    }
+    ConsoleSession console(*started, options.json, out, err);
+    return console.run(*input) ? 0 : 1;
+}
+
+}  // namespace xtok::tools
