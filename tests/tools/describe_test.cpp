@@ -1,0 +1,121 @@
+// The description block found in the real plug-in file, and damaged or
+// foreign blocks refused with a reason instead of read past their end.
+#include "tools/describe.h"
+
+#include <gtest/gtest.h>
+#include <zlib.h>
+
+#include <fstream>
+#include <sstream>
+
+namespace xtok::tools {
+namespace {
+
+const char* const kMemoryTypes[] = {
+    "tx_token",    "rx_token",     "rx_token_len",      "tokens_available", "token_ack",
+    "connect",     "SP_Baud",      "SP_Bits",           "SP_Stop",          "SP_Par",
+    "SP_Mode",     "SP_RxPrefix",  "SP_RxSuffix",       "SP_Gap",           "SP_TxPrefix",
+    "SP_TxSuffix", "SP_HexTokens", "SP_TokenQueueSize", "SP_Done"};
+
+std::string fileBytes(const std::string& path) {
+    std::ifstream file(path, std::ios::binary);
+    std::ostringstream content;
+    content << file.rdbuf();
+    return content.str();
+}
+
+std::string deflated(const std::string& text) {
+    uLongf size = compressBound(text.size());
+    std::string out(size, '\0');
+    compress(reinterpret_cast<Bytef*>(out.data()), &size,
+             reinterpret_cast<const Bytef*>(text.data()), text.size());
+    out.resize(size);
+    return out;
+}
+
+/// A block as a plug-in carries it, inside some surrounding bytes.
+std::string block(const std::string& compressed, std::size_t claimed, const std::string& end) {
+    return std::string(
+               "\x7F"
+               "ELF...",
+               7) +
+           "<<ICOM_XML_START>>Name=T?Version=1" + '\0' +
+           "compressedXML=" + std::to_string(claimed) + '\0' + compressed + end + '\0' + "tail";
+}
+
+TEST(Describe, TheRealPluginDescribesItsNineteenMemoryTypes) {
+    DescriptionBlock found;
+    std::string xml;
+    std::string error;
+    ASSERT_TRUE(findDescription(fileBytes(XTOK_PLUGIN_PATH), found, error)) << error;
+    using Field = std::pair<std::string, std::string>;
+    EXPECT_EQ(found.header, (std::vector<Field>{{"Name", "XTOK"},
+                                                {"FullName", "Xtokline"},
+                                                {"Version", "106"},
+                                                {"Platform", "PX40_WCE6"}}));
+    ASSERT_TRUE(inflateDescription(found.compressed, xml, error)) << error;
+    EXPECT_EQ(xml.rfind("<?xml version=", 0), 0u);
+    EXPECT_EQ(xml.substr(xml.size() - 16), "</protocol_cfg>\n");
+    std::ostringstream summary;
+    ASSERT_TRUE(summarizeDescription(found, xml, summary, error)) << error;
+    std::string text = summary.str();
+    std::string memoryTypes = text.substr(text.find("Memory types (19):"));
+    for (const char* name : kMemoryTypes) {
+        EXPECT_NE(memoryTypes.find(std::string("  ") + name + " "), std::string::npos) << name;
+    }
+    EXPECT_NE(text.find("Parameters (16):"), std::string::npos) << text;
+}
+
+TEST(Describe, RefusesDamagedBlocksWithAReason) {
+    const std::string xml =
+        "<?xml version=\"1.0\"?>\n<protocol_cfg><memtypes>"
+        "<memtype display=\"A\">a</memtype></memtypes></protocol_cfg>\n";
+    const std::string good = deflated(xml);
+    std::string flipped = good;
+    flipped[good.size() / 2] = static_cast<char>(flipped[good.size() / 2] ^ 0x55);
+    const std::string cut = good.substr(0, good.size() - 6);
+    const std::string end = "<<ICOM_XML_END>>";
+    std::string unnumbered = block(good, 0, end);
+    unnumbered.replace(unnumbered.find("compressedXML=0"), 15, "compressedXML=x");
+    struct Case {
+        const char* what;
+        std::string file;
+        const char* error;  // "" when the block reads
+    } cases[] = {
+        {"whole", block(good, good.size(), end), ""},
+        {"no marker", "just some library bytes", "no <<ICOM_XML_START>> marker"},
+        {"header never ends", "<<ICOM_XML_START>>" + std::string(5000, 'x'), "header line"},
+        {"no size line", std::string("<<ICOM_XML_START>>N=1\0oops\0", 27), "compressedXML=N"},
+        {"size past the file", block(good, 999999, end), "no <<ICOM_XML_END>> marker"},
+        {"size not a number", unnumbered, "compressedXML=N"},
+        {"wrong end marker", block(good, good.size(), "<<ICOM_XML_STOP>>"), "END>> marker"},
+        {"size too short", block(good, good.size() - 1, end), "END>> marker"},
+        {"stream damaged", block(flipped, flipped.size(), end), "damaged"},
+        {"stream cut short", block(cut, cut.size(), end), "cut short"},
+    };
+    for (const Case& c : cases) {
+        DescriptionBlock found;
+        std::string inflated;
+        std::string error;
+        bool ok = findDescription(c.file, found, error) &&
+                  inflateDescription(found.compressed, inflated, error);
+        EXPECT_EQ(ok, *c.error == '\0') << c.what << ": " << error;
+        EXPECT_NE(error.find(c.error), std::string::npos) << c.what << ": " << error;
+        if (ok) {
+            EXPECT_EQ(inflated, xml) << c.what;
+        }
+    }
+}
+
+TEST(Describe, MisshapenXmlIsRefusedNotReadPast) {
+    DescriptionBlock found;
+    std::ostringstream out;
+    std::string error;
+    for (const char* xml : {"<protocol_cfg><memtype display=\"A>a", "<protocol_cfg", "<>"}) {
+        EXPECT_FALSE(summarizeDescription(found, xml, out, error)) << xml;
+        EXPECT_NE(error.find("no XML document"), std::string::npos) << error;
+    }
+}
+
+}  // namespace
+}  // namespace xtok::tools
