@@ -9,7 +9,7 @@ const char* const kServiceNames[9] = {"IMultiTask2",      "ISerialFactory", "ISo
 FakeHost::FakeHost() {
     // Services the plug-in only holds answer the four common slots.
     for (const char* name : kServiceNames) {
-        owned_.push_back(std::make_unique<FakeService<IHostService>>(name, 100));
+        owned_.push_back(std::make_unique<PlainService>(name, 100));
         services_[name] = owned_.back().get();
     }
     services_["IMultiTask2"] = static_cast<IMultiTask2*>(&tasks_);

@@ -22,6 +22,13 @@ namespace xtok::test {
 /// The service names a runtime offers, in the order the module asks for them.
 extern const char* const kServiceNames[9];
 
+/// A service the plug-in only holds: the four common slots. Final, so that
+/// the host can own it without a virtual destructor in the contract's table.
+class PlainService final : public FakeService<IHostService> {
+public:
+    using FakeService::FakeService;
+};
+
 /// Every service a runtime offers, backed by the fakes above.
 class FakeHost : public IServiceProvider {
 public:
@@ -53,7 +60,7 @@ private:
     FakeStorage storage_;
     FakeMultiTask tasks_;  // last: its task threads end before the others go
     std::map<std::string, void*> services_;
-    std::vector<std::unique_ptr<FakeService<IHostService>>> owned_;
+    std::vector<std::unique_ptr<PlainService>> owned_;
     std::set<std::string> refused_;
     mutable std::mutex mutex_;
     std::vector<std::string> calls_;

@@ -34,6 +34,7 @@ ISerialPort* FakeSerialFactory::Open(const char* name) {
     }
     ++opens_;
     ++open_;
+    hungUp_ = false;  // a port opened again has a live line
     ports_.push_back(std::make_unique<FakeSerialPort>(*this, names_.back()));
     return ports_.back().get();
 }
@@ -64,10 +65,39 @@ void FakeSerialFactory::silence() {
     changed_.notify_all();
 }
 
+void FakeSerialFactory::readError() {
+    std::lock_guard<std::mutex> lock(mutex_);
+    script_.push_back({Kind::Error, 0});
+    readAfterEmpty_ = false;
+    changed_.notify_all();
+}
+
+void FakeSerialFactory::hangUp() {
+    std::lock_guard<std::mutex> lock(mutex_);
+    script_.push_back({Kind::HangUp, 0});
+    readAfterEmpty_ = false;
+    changed_.notify_all();
+}
+
+std::size_t FakeSerialFactory::pending() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return script_.size();
+}
+
 bool FakeSerialFactory::read(uint8_t* destination, int32_t timeoutMs) {
     std::unique_lock<std::mutex> lock(mutex_);
+    ++reads_;
     if (timeouts_.size() < kMaxTimeouts) {
         timeouts_.push_back(timeoutMs);
+    }
+    if (hungUp_) {
+        // Fails at once; what is still scripted waits for the port to be
+        // opened again.
+        if (script_.empty()) {
+            readAfterEmpty_ = true;
+            changed_.notify_all();
+        }
+        return false;
     }
     if (script_.empty()) {
         readAfterEmpty_ = true;
@@ -83,7 +113,10 @@ bool FakeSerialFactory::read(uint8_t* destination, int32_t timeoutMs) {
     }
     Event event = script_.front();
     script_.pop_front();
-    if (event.kind == Kind::Silence) {
+    if (event.kind == Kind::HangUp) {
+        hungUp_ = true;
+    }
+    if (event.kind != Kind::Byte) {
         return false;
     }
     *destination = event.byte;
@@ -139,6 +172,16 @@ std::vector<std::string> FakeSerialFactory::openedNames() const {
 std::vector<int32_t> FakeSerialFactory::readTimeouts() const {
     std::lock_guard<std::mutex> lock(mutex_);
     return timeouts_;
+}
+
+long FakeSerialFactory::reads() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return reads_;
+}
+
+bool FakeSerialFactory::hungUp() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return hungUp_;
 }
 
 }  // namespace xtok::test

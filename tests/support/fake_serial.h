@@ -57,6 +57,13 @@ public:
     void feed(const std::string& bytes);  ///< bytes arrive, one per read
     void feedBytes(const std::vector<uint8_t>& bytes);
     void silence();  ///< one read answers a time-out
+    /// One read fails at once, as a port that reports a line error does.
+    void readError();
+    /// The device hangs up: from this event on every read fails at once,
+    /// until the port is opened again.
+    void hangUp();
+    /// Scripted events not read yet.
+    std::size_t pending() const;
     /// Waits (bounded) until every scripted event has been read and one
     /// more read found the script empty: the reader has acted on all of it.
     bool waitDrained(int timeoutMs = 5000);
@@ -76,10 +83,13 @@ public:
     std::vector<std::string> openedNames() const;
     /// Time-out arguments seen by ReadByte, most recent last (bounded).
     std::vector<int32_t> readTimeouts() const;
+    /// ReadByte calls so far (not bounded like readTimeouts).
+    long reads() const;
+    bool hungUp() const;
 
 private:
     friend class FakeSerialPort;
-    enum class Kind { Byte, Silence };
+    enum class Kind { Byte, Silence, Error, HangUp };
     struct Event {
         Kind kind;
         uint8_t byte;
@@ -90,12 +100,14 @@ private:
     std::condition_variable changed_;
     std::deque<Event> script_;
     bool readAfterEmpty_ = false;
+    bool hungUp_ = false;
     std::vector<std::unique_ptr<FakeSerialPort>> ports_;
     int open_ = 0, opens_ = 0, closes_ = 0;
     std::vector<LineSettings> configured_;
     std::vector<std::string> writes_;
     std::vector<std::string> names_;
     std::vector<int32_t> timeouts_;
+    long reads_ = 0;
 };
 
 }  // namespace xtok::test
