@@ -1,5 +1,6 @@
 #include "protocol/protocol_xtok.h"
 
+#include <climits>
 #include <cstring>
 #include <new>
 
@@ -22,12 +23,16 @@ Protocol_XTOK::Protocol_XTOK()
 }
 
 Protocol_XTOK::~Protocol_XTOK() {
-    // A runtime stops the protocol first; should it not have, the task must
-    // not outlive the object it reads.
+    // A runtime stops the protocol first; should it not have, or should the
+    // host's stop have timed out, the task must not outlive the object it
+    // reads. With the port given up, a pass ends within one read time-out.
+    connected_ = false;
     if (task_.HasTask()) {
-        connected_ = false;
         task_.StopTask(1000);
     }
+    const int32_t gap = gap_.load();
+    const int32_t readTimeout = gap > 0 ? gap : 500;
+    task_.Retire(readTimeout < INT32_MAX - 10000 ? readTimeout + 10000 : INT32_MAX);
     if (IMultiTask2* tasks = services().multiTask) {
         tasks->DestroyMutex(queueLock_);
         tasks->DestroyMutex(portLock_);

@@ -2,6 +2,7 @@
 // for as long as the protocol is started.
 #pragma once
 
+#include <atomic>
 #include <cstdint>
 
 #include "xtokline/host.h"
@@ -27,13 +28,25 @@ public:
         }
     }
     bool HasTask() const { return handle_ != nullptr; }
+    /// Ends the body for good, whatever the host's StopTask answered: it
+    /// leaves its loop at the next pass, and this returns once it has, or
+    /// after about `waitMs` should the host keep it inside one of its own
+    /// calls for longer. The object may go away only after this.
+    void Retire(int32_t waitMs);
 
 protected:
     ~TaskBase() = default;
+    /// For the body's loop: false once the host asks the task to end or the
+    /// task has been retired.
+    bool ShouldRun() { return !retired_.load(std::memory_order_acquire) && !IsStopRequested(); }
+    /// The body's last touch of this object, as it returns.
+    void Finished() { running_.store(false, std::memory_order_release); }
 
 private:
     ITask* handle_ = nullptr;
     IMultiTask2* multiTask_;
+    std::atomic<bool> running_{false};  ///< the host has the body running
+    std::atomic<bool> retired_{false};
 };
 
 class ReceiveTask final : public TaskBase {
