@@ -116,14 +116,21 @@ bool SerialPort::Configure(int32_t baud, int32_t parity, int32_t bits, int32_t s
     return true;
 }
 
+// Called once per received byte: a copy out of the buffer, with the reading
+// and waiting out of line.
 bool SerialPort::ReadByte(uint8_t* destination, int32_t timeoutMs, int32_t) {
-    if (!destination) {
+    if (destination && !buffer_.empty()) {
+        *destination = buffer_.take();
+        return true;
+    }
+    return readWaiting(destination, timeoutMs);
+}
+
+bool SerialPort::readWaiting(uint8_t* destination, int32_t timeoutMs) {
+    if (!destination || !refill(std::max(timeoutMs, 0))) {
         return false;
     }
-    if (next_ == end_ && !refill(std::max(timeoutMs, 0))) {
-        return false;
-    }
-    *destination = buffer_[next_++];
+    *destination = buffer_.take();
     return true;
 }
 
@@ -139,10 +146,9 @@ bool SerialPort::refill(int32_t timeoutMs) {
             return false;
         }
         if (count > 0 && (ready.revents & POLLIN)) {
-            ssize_t got = ::read(fd_, buffer_.data(), buffer_.size());
+            ssize_t got = ::read(fd_, buffer_.space(), ReadBuffer::kCapacity);
             if (got > 0) {
-                next_ = 0;
-                end_ = static_cast<std::size_t>(got);
+                buffer_.filled(static_cast<std::size_t>(got));
                 return true;
             }
             if (got < 0 && (errno == EAGAIN || errno == EINTR)) {

@@ -15,6 +15,28 @@ namespace xtok::host {
 
 class SerialFactory;
 
+/// Bytes of the last read(2) not handed out yet: one read serves a whole
+/// burst, and each ReadByte after it is a copy out of memory.
+class ReadBuffer {
+public:
+    static constexpr std::size_t kCapacity = 4096;
+
+    bool empty() const { return next_ == end_; }
+    /// The next byte; only when not empty().
+    uint8_t take() { return bytes_[next_++]; }
+    /// Where a read puts new bytes, then filled() with how many it put.
+    uint8_t* space() { return bytes_.data(); }
+    void filled(std::size_t count) {
+        next_ = 0;
+        end_ = count;
+    }
+
+private:
+    std::size_t next_ = 0;
+    std::size_t end_ = 0;
+    std::array<uint8_t, kCapacity> bytes_{};
+};
+
 class SerialPort final : public ISerialPort {
 public:
     /// Opens `device` for raw transfer. Null with `error` set when it cannot.
@@ -38,6 +60,7 @@ public:
 
 private:
     SerialPort(std::string device, SerialFactory& factory, sp_port* port, int fd);
+    [[gnu::noinline]] bool readWaiting(uint8_t* destination, int32_t timeoutMs);
     bool refill(int32_t timeoutMs);
     bool waitWritable();
 
@@ -47,11 +70,7 @@ private:
     // devices outside sysfs); fd_ is then ours to close.
     sp_port* port_;
     int fd_;
-    // Bytes of the last read not handed out yet: one read serves a whole
-    // burst, then ReadByte is a copy.
-    std::array<uint8_t, 4096> buffer_{};
-    std::size_t next_ = 0;
-    std::size_t end_ = 0;
+    ReadBuffer buffer_;
 };
 
 }  // namespace xtok::host
