@@ -74,7 +74,10 @@ private:
     // Receiving.
     enum class ReadResult { Byte, Timeout, Disconnected };
     void pushToken(const char* bytes, std::size_t length);
-    ReadResult readByteLocked(uint8_t& byte, int32_t timeoutMs);
+    /// One byte into `byte`, with portLock_ held around the read the way
+    /// `portLock` holds it (see receive_framing.cpp).
+    template <class Lock>
+    ReadResult readByteLocked(const Lock& portLock, uint8_t* byte, int32_t timeoutMs);
 
     // Reads and writes of the memory types.
     bool readMemoryType(XtokTag& tag, int32_t element, uint8_t* buffer);
@@ -113,6 +116,12 @@ private:
     std::atomic<bool> hexTokens_{false};
     std::atomic<int32_t> tokenQueueSize_{100};
     std::string frame_;  ///< the receive task's frame under collection, reused
+    /// The receive task's framing bytes, converted from rxPrefix_ and
+    /// rxSuffix_ again whenever those texts have changed (their versions).
+    struct FramingBytes {
+        std::string bytes;
+        uint64_t version = ~uint64_t{0};
+    } rxPrefixBytes_, rxSuffixBytes_;
     std::string portName_;
     std::atomic<int32_t> baud_{0}, bits_{0}, stop_{0}, parity_{0}, mode_{0};
     SerialPort port_;

@@ -5,6 +5,7 @@
 #pragma once
 
 #include <atomic>
+#include <cstdint>
 #include <mutex>
 #include <string>
 
@@ -32,11 +33,18 @@ public:
     void set(std::string text) {
         std::lock_guard<SpinLock> guard(lock_);
         text_.swap(text);
+        version_.fetch_add(1, std::memory_order_release);
     }
+    /// Changes with every set. A reader that keeps something derived from the
+    /// text reads this before get(), and derives again when it differs from
+    /// the version it derived from: a set between the two only costs one
+    /// more derivation.
+    uint64_t version() const { return version_.load(std::memory_order_acquire); }
 
 private:
     mutable SpinLock lock_;
     std::string text_;
+    std::atomic<uint64_t> version_{0};
 };
 
 }  // namespace xtok

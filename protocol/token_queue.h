@@ -2,12 +2,17 @@
 // queueLock around every use (the console's commands excepted).
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
-#include <deque>
 #include <string>
+#include <vector>
 
 namespace xtok {
 
+/// First in, first out. The entries live in a ring of strings that keep
+/// their storage when a token is acknowledged, so that once the ring has
+/// grown to the queue's working size a push copies the token into memory it
+/// already has: no allocation per token on the receive path.
 class TokenQueue {
 public:
     /// Drops the oldest entry when `limit` entries or more are queued (one
@@ -16,17 +21,20 @@ public:
     /// `hex` is on.
     void push(const char* bytes, std::size_t length, int32_t limit, bool hex);
     /// The head in its stored form; null when the queue is empty.
-    const std::string* head() const { return tokens_.empty() ? nullptr : &tokens_.front(); }
-    int32_t count() const { return static_cast<int32_t>(tokens_.size()); }
-    void removeHead() {
-        if (!tokens_.empty()) {
-            tokens_.pop_front();
-        }
-    }
-    void clear() { tokens_.clear(); }
+    const std::string* head() const { return count_ == 0 ? nullptr : &ring_[head_]; }
+    int32_t count() const { return static_cast<int32_t>(count_); }
+    void removeHead();
+    /// Empties the queue and gives its memory back.
+    void clear();
 
 private:
-    std::deque<std::string> tokens_;
+    void grow();
+
+    // A power of two long (or empty); the queued entries are the count_ from
+    // head_ on, wrapping; the others are spare storage.
+    std::vector<std::string> ring_;
+    std::size_t head_ = 0;
+    std::size_t count_ = 0;
 };
 
 }  // namespace xtok
