@@ -105,8 +105,9 @@ int main(int argc, char** argv) {
                            "The plug-in file (default: beside xtok-host)");
     runCommand->add_option("--instance", run.instanceName,
                            "Instance name, under which settings are retained (default: XTOK)");
-    runCommand->add_option("--exec", run.exec,
-                           "Commands separated by ';' instead of standard input");
+    runCommand->add_option(
+        "--exec", run.exec,
+        "Commands separated by ';' (\\; for one inside a value) instead of standard input");
     runCommand->add_flag("--json", run.json, "One JSON object per result, one per line");
 
     std::string describePath;

@@ -156,6 +156,23 @@ std::string PluginSession::lastError() {
     return text && *text ? text : "the plug-in gives no reason";
 }
 
+PluginSession::ErrorRecord PluginSession::errorRecord() {
+    const char* text = protocol_->GetLastErrorText();
+    return {protocol_->GetLastErrorCode(), text ? text : ""};
+}
+
+// Some refusals (a data bits value of 9, say) leave the error record as it
+// was: an unchanged record may be an older failure's, and is said to be.
+std::string PluginSession::reasonSince(const ErrorRecord& before) {
+    ErrorRecord after = errorRecord();
+    if (after.code != before.code || after.text != before.text) {
+        return lastError();
+    }
+    return after.text.empty()
+               ? "refused without a reason"
+               : "refused; the plug-in's last error, perhaps an older one: " + after.text;
+}
+
 ITag* PluginSession::tag(const std::string& address, std::string& error) {
     auto found = tags_.find(address);
     if (found != tags_.end()) {
@@ -183,8 +200,9 @@ bool PluginSession::readBytes(ITag& tag, std::vector<uint8_t>& bytes, std::strin
     bytes.assign(static_cast<std::size_t>(size > 0 ? size : 0), 0);
     // A tag of size 0 still gets a valid address to write nothing to.
     uint8_t none = 0;
+    ErrorRecord before = errorRecord();
     if (!protocol_->ReadTag(&tag, bytes.empty() ? &none : bytes.data())) {
-        error = std::string("cannot read ") + tag.GetUri() + ": " + lastError();
+        error = std::string("cannot read ") + tag.GetUri() + ": " + reasonSince(before);
         return false;
     }
     return true;
@@ -206,8 +224,9 @@ bool PluginSession::write(const std::string& address, const std::string& text, s
         return false;
     }
     uint8_t none = 0;
+    ErrorRecord before = errorRecord();
     if (!protocol_->WriteTag(found, bytes.empty() ? &none : bytes.data())) {
-        error = "cannot write " + address + ": " + lastError();
+        error = "cannot write " + address + ": " + reasonSince(before);
         return false;
     }
     return true;

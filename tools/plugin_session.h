@@ -74,6 +74,13 @@ private:
     bool load(const SessionOptions& options, std::string& error);
     bool readBytes(ITag& tag, std::vector<uint8_t>& bytes, std::string& error);
     std::string lastError();
+    struct ErrorRecord {
+        int32_t code;
+        std::string text;
+    };
+    ErrorRecord errorRecord();
+    /// Why the call that followed `before` failed.
+    std::string reasonSince(const ErrorRecord& before);
 
     struct TagDeleter {
         void operator()(ITag* tag) const;

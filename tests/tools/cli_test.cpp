@@ -48,6 +48,15 @@ TEST(Cli, DemoShowsTokensWithinSecondsAndStopsAtTheCount) {
     EXPECT_EQ(done.err, "");
 }
 
+TEST(Cli, CtrlCEndsTheDemoCleanly) {
+    Subprocess demo({kHost, "demo", "--interval", "50", "--plugin", kPlugin});
+    ASSERT_TRUE(demo.waitForOutput("received  \"", 5s));
+    demo.interrupt();
+    Finished done = demo.finish(10s);
+    EXPECT_EQ(done.status, 0) << done.err;
+    EXPECT_NE(done.out.find(" received, "), std::string::npos) << done.out;
+}
+
 class Session : public ::testing::Test {
 protected:
     void SetUp() override {
@@ -88,6 +97,21 @@ TEST_F(Session, ScriptedRunReadsWritesAndWatches) {
     EXPECT_EQ(lines[4], "19200");
     EXPECT_EQ(lines[5], "Connected");
     EXPECT_EQ(device_->tokens(), std::vector<std::string>{"HELLO"});
+}
+
+TEST_F(Session, CtrlCEndsAWatchAndTheScriptGoesOn) {
+    device_.reset();
+    DeviceOptions reader;
+    reader.codes = {"4006381333931"};
+    reader.interval = 50ms;
+    reader.firstCode = 0ms;
+    device_ = std::make_unique<SimulatedDevice>(line_->master(), reader);
+    Subprocess session(run({"--exec", "watch; get_stat"}));
+    ASSERT_TRUE(session.waitForOutput("\"4006381333931\"", 5s));
+    session.interrupt();
+    Finished done = session.finish(10s);
+    EXPECT_EQ(done.status, 0) << done.err;
+    EXPECT_EQ(linesOf(done.out).back(), "Connected") << done.out;
 }
 
 TEST_F(Session, JsonGivesOneObjectPerResult) {

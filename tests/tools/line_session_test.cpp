@@ -126,9 +126,13 @@ TEST_F(Line, SerialDoneChangesTheLineOnlyWhenWritten) {
     char active[64] = {};
     session_->protocol().GetSerialSettings(active, sizeof active - 1);
     EXPECT_STREQ(active, (pty_->slavePath() + ",19200,even,7,1,RS-232").c_str());
-    // Refused values change nothing.
+    // Refused values change nothing; a refusal the plug-in gives no reason
+    // for is not passed off under the previous one's.
     EXPECT_NE(write("0?SP_Baud?unsignedInt", "14400").find("illegal baudrate"), std::string::npos);
     EXPECT_EQ(readUnsigned("0?SP_Baud?unsignedInt"), 19200u);
+    EXPECT_NE(write("0?SP_Bits?unsignedByte", "9").find("perhaps an older one: illegal baudrate"),
+              std::string::npos);
+    EXPECT_EQ(readUnsigned("0?SP_Bits?unsignedByte"), 7u);
 }
 
 TEST_F(Line, RetainedSettingsSurviveARestartThroughTheStateFile) {

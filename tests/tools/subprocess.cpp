@@ -127,6 +127,12 @@ bool Subprocess::waitForOutput(const std::string& text, std::chrono::millisecond
     return true;
 }
 
+void Subprocess::interrupt() {
+    if (pid_ > 0) {
+        kill(pid_, SIGINT);
+    }
+}
+
 Finished Subprocess::finish(std::chrono::milliseconds patience) {
     Clock::time_point deadline = Clock::now() + patience;
     while (Clock::now() < deadline && pump(remainingMs(deadline))) {

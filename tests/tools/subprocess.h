@@ -32,6 +32,8 @@ public:
     /// Reads output until standard output holds `text`; false when the
     /// deadline passed or the output ended first.
     bool waitForOutput(const std::string& text, std::chrono::milliseconds patience);
+    /// Ctrl-C, as a person at the terminal would press it.
+    void interrupt();
     /// Waits for the child to end, killing it at the deadline.
     Finished finish(std::chrono::milliseconds patience);
 
