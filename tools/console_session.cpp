@@ -158,7 +158,10 @@ bool ConsoleSession::execute(const std::string& raw) {
     if (word == "settings") {
         return settings(line);
     }
-    return passOn(line);
+    // As typed but for the margins: "put" sends the rest of its line,
+    // trailing blanks included.
+    std::string typed = raw.substr(raw.find_first_not_of(" \t"));
+    return passOn(typed.substr(0, typed.find_last_not_of("\r\n") + 1));
 }
 
 bool ConsoleSession::fail(const std::string& line, const std::string& error) {

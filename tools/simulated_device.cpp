@@ -215,7 +215,10 @@ void SimulatedDevice::answer(const std::string& token) {
     const std::string& suffix = options_.sendSuffix;
     if (token == "!talk") {
         silent_ = false;
-    } else if (silent_ || !options_.answer) {
+    } else if (silent_) {
+        return;
+    }
+    if (!options_.answer) {
         return;
     }
     if (token == "!silent") {
