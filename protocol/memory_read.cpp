@@ -2,9 +2,9 @@
 // the line settings.
 #include <algorithm>
 #include <cstring>
-#include <vector>
 
 #include "framework/data_types.h"
+#include "framework/scratch_buffer.h"
 #include "protocol/host_lock.h"
 #include "protocol/protocol_xtok.h"
 #include "protocol/xtok_tag.h"
@@ -12,6 +12,10 @@
 namespace xtok {
 
 namespace {
+
+// Scratch bytes kept in the call's own frame: a string-64 tag with its
+// slack, and every number.
+constexpr std::size_t kScratchInline = 128;
 
 void putInt(uint8_t* buffer, int32_t value) {
     std::memcpy(buffer, &value, sizeof value);
@@ -52,7 +56,12 @@ bool Protocol_XTOK::ReadTagRaw(ITag* itag, void* buffer, int32_t size) {
         count = (int64_t{offset} + size + elementSize - 1) / elementSize;
         total = count * elementSize;
     }
-    std::vector<uint8_t> scratch(static_cast<std::size_t>(total + slackFor(tag)), 0);
+    // In the object for the common small tags: no allocation per read.
+    ScratchBuffer<kScratchInline> scratch(static_cast<int32_t>(total + slackFor(tag)));
+    if (!scratch.ok()) {
+        SetLastError(-1, kNoMemoryText);
+        return false;
+    }
     const int64_t block = type.blockReadCount > 0 ? type.blockReadCount : 1;
     std::size_t position = 0;
     while (count >= 1) {

@@ -2,9 +2,9 @@
 // line settings staged until SP_Done applies them.
 #include <algorithm>
 #include <cstring>
-#include <vector>
 
 #include "framework/data_types.h"
+#include "framework/scratch_buffer.h"
 #include "protocol/hex_text.h"
 #include "protocol/host_lock.h"
 #include "protocol/protocol_xtok.h"
@@ -13,6 +13,10 @@
 namespace xtok {
 
 namespace {
+
+// Scratch bytes kept in the call's own frame: a string-64 tag with its
+// slack, and every number.
+constexpr std::size_t kScratchInline = 128;
 
 int32_t takeInt(const uint8_t* value) {
     int32_t v = 0;
@@ -72,8 +76,13 @@ bool Protocol_XTOK::WriteTag(ITag* itag, const void* value) {
     }
     // Room for the converted value and for what a read of a settings or
     // token type may put there.
-    std::vector<uint8_t> scratch(
-        static_cast<std::size_t>(std::max<int64_t>(total, offset + rawSize) + 8), 0);
+    // In the object for the common small tags: no allocation per write.
+    ScratchBuffer<kScratchInline> scratch(
+        static_cast<int32_t>(std::max<int64_t>(total, offset + rawSize) + 8));
+    if (!scratch.ok()) {
+        SetLastError(-1, kNoMemoryText);
+        return false;
+    }
     if (!bits && !(offset == 0 && total == rawSize) &&
         !partialRead(tag, index, static_cast<int32_t>(count), offset, rawSize, elementSize,
                      scratch.data())) {
