@@ -196,18 +196,39 @@ def micro_table(micro, callgrind):
     names = sorted(rows) or sorted(f"ReceivePath/{m}" for m in (callgrind or {}))
     for name in names:
         b = rows.get(name, {})
+        shown = "/".join(name.split("/")[:2])
         mode = name.split("/", 1)[1] if name.startswith("ReceivePath/") else None
         # Google Benchmark writes inverted rates in seconds.
         ns_byte = f"{b['ns_per_byte'] * 1e9:.2f}" if "ns_per_byte" in b else "–"
-        ns_token = f"{b['ns_per_token'] * 1e9:.0f}" if "ns_per_token" in b else (
-            f"{b['cpu_time']:.1f} per lock and unlock" if name.startswith("HostLock") and b
-            else "–")
+        if "ns_per_token" in b:
+            ns_token = f"{b['ns_per_token'] * 1e9:.0f} per token"
+        elif name.startswith("HostLock") and b:
+            ns_token = f"{b['cpu_time']:.1f} per lock and unlock"
+        elif name.startswith("Kernel/") and b:
+            ns_token = f"{b['cpu_time']:,.0f} per token (process CPU)"
+        else:
+            ns_token = "–"
         ir = "–"
         if mode and callgrind and mode in callgrind:
             r = callgrind[mode]
             ir = f"{r['instructions'] / r['bytes']:.1f}"
-        lines.append(f"| {name} | {ns_byte} | {ir} | {ns_token} |")
+        lines.append(f"| {shown} | {ns_byte} | {ir} | {ns_token} |")
     return "\n".join(lines)
+
+
+def goal_line(summary, workload, key):
+    readers = summary.get(workload, {})
+    if key == "cpu_mb":
+        _, best = best_peer(readers, key, "low")
+        return (best / 2, "goal: half the best peer") if best else None
+    if key == "mb_s":
+        _, best = best_peer(readers, key, "high")
+        return (best, "goal: the best peer") if best else None
+    if key == "core_pct":
+        return 0.5, "goal: 0.5%"
+    if key == "p99_us":
+        return 100, "goal: p99 100 µs (dotted: p50 50 µs)"
+    return None
 
 
 def chart(summary, path):
@@ -219,8 +240,8 @@ def chart(summary, path):
         return False
     panels = [
         ("saturation", "mb_s", "Saturation: throughput (MB/s, higher is better)", False),
-        ("saturation", "cpu_mb", "Saturation: CPU seconds per MB (lower is better)", False),
-        ("linerate", "core_pct", "Line rate: % of a core (lower is better)", False),
+        ("saturation", "cpu_mb", "Saturation: CPU seconds per MB (lower is better, log)", False),
+        ("linerate", "core_pct", "Line rate: % of a core (lower is better, log)", False),
         ("linerate", "p99_us", "Line rate: latency p50 / p99 (µs, log)", True),
     ]
     fig, axes = plt.subplots(2, 2, figsize=(12, 8))
@@ -243,6 +264,16 @@ def chart(summary, path):
             lo = [readers[n][key][0] - readers[n][key][1] for n in names]
             hi = [readers[n][key][2] - readers[n][key][0] for n in names]
             ax.bar(xs, med, color=colours, yerr=[lo, hi], capsize=3)
+        if key in ("cpu_mb", "core_pct"):
+            ax.set_yscale("log")  # the peers spread over two decades
+        goal = goal_line(summary, workload, key)
+        if goal:
+            value, label = goal
+            ax.axhline(value, color="#1b9e77", linestyle="--", linewidth=1.2)
+            ax.text(-0.45, value, label, color="#1b9e77", fontsize=8, va="bottom", ha="left",
+                    bbox=dict(facecolor="white", edgecolor="none", alpha=0.8, pad=1))
+        if latency:
+            ax.axhline(50, color="#1b9e77", linestyle=":", linewidth=1.2)
         ax.set_xticks(list(xs))
         ax.set_xticklabels(names, rotation=15, fontsize=8)
         ax.set_title(title, fontsize=10)
