@@ -50,9 +50,10 @@ void Protocol_XTOK::pushToken(const char* bytes, std::size_t length) {
 
 namespace {
 
-// How a pass holds portLock around each byte read. The host always gives the
-// protocol its locks, but for one that could not make them; the pass is
-// compiled for either case, so that the per-byte path never asks which.
+// How a pass holds portLock around each byte read. A host gives the protocol
+// its locks unless it could not make them, and then there is none to take;
+// the pass is compiled for either case, so that the per-byte path never asks
+// which.
 struct PortLock {
     IMutex& mutex;
     void lock() const { mutex.Lock(); }
