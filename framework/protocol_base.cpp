@@ -228,16 +228,20 @@ bool ProtocolBase::CheckArrayItem(ITag* tag, int32_t index) {
     return true;
 }
 
+bool ProtocolBase::ReadWhole(ITag* tag, ScratchBuffer<256>& whole) {
+    if (!whole.ok()) {
+        SetLastError(-1, kNoMemoryText);
+        return false;
+    }
+    return ReadTag(tag, whole.data());
+}
+
 bool ProtocolBase::ReadArrayItem(ITag* tag, int32_t index, void* value) {
     if (!CheckArrayItem(tag, index) || !value) {
         return false;
     }
     ScratchBuffer<256> whole(tag->GetSize());
-    if (!whole.ok()) {
-        SetLastError(-1, kNoMemoryText);
-        return false;
-    }
-    if (!ReadTag(tag, whole.data())) {
+    if (!ReadWhole(tag, whole)) {
         return false;
     }
     const int32_t width = elementSizeOf(*tag);
@@ -251,11 +255,7 @@ bool ProtocolBase::WriteArrayItem(ITag* tag, int32_t index, const void* value) {
         return false;
     }
     ScratchBuffer<256> whole(tag->GetSize());
-    if (!whole.ok()) {
-        SetLastError(-1, kNoMemoryText);
-        return false;
-    }
-    if (!ReadTag(tag, whole.data())) {
+    if (!ReadWhole(tag, whole)) {
         return false;
     }
     const int32_t width = elementSizeOf(*tag);

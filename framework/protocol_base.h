@@ -12,6 +12,7 @@
 #include <list>
 #include <string>
 
+#include "framework/scratch_buffer.h"
 #include "xtokline/protocol.h"
 
 namespace xtok {
@@ -134,6 +135,8 @@ protected:
 
 private:
     bool CheckArrayItem(ITag* tag, int32_t index);
+    /// The whole tag, through ReadTag, into a buffer sized for it.
+    bool ReadWhole(ITag* tag, ScratchBuffer<256>& whole);
     void ConsoleRead(const std::string& uri, char* reply, int32_t size);
     void ConsoleWrite(const std::string& uri, const std::string& hex, char* reply, int32_t size);
 

@@ -44,41 +44,27 @@ void StagedStore::stageText(const std::string& name, int32_t node, const std::st
     stage(std::move(v));
 }
 
-bool StagedStore::find(const std::string& name, int32_t node, StagedValue& out) const {
+template <class T>
+bool StagedStore::find(const std::string& name, int32_t node, T StagedValue::*field, T& out) const {
     std::lock_guard<SpinLock> guard(lock_);
     auto it = entries_.find(stagedKey(name, node));
     if (it == entries_.end()) {
         return false;
     }
-    out = it->second;
+    out = it->second.*field;
     return true;
 }
 
 bool StagedStore::findBool(const std::string& name, int32_t node, bool& out) const {
-    StagedValue v;
-    if (!find(name, node, v)) {
-        return false;
-    }
-    out = v.boolValue;
-    return true;
+    return find(name, node, &StagedValue::boolValue, out);
 }
 
 bool StagedStore::findInt(const std::string& name, int32_t node, int32_t& out) const {
-    StagedValue v;
-    if (!find(name, node, v)) {
-        return false;
-    }
-    out = v.intValue;
-    return true;
+    return find(name, node, &StagedValue::intValue, out);
 }
 
 bool StagedStore::findText(const std::string& name, int32_t node, std::string& out) const {
-    StagedValue v;
-    if (!find(name, node, v)) {
-        return false;
-    }
-    out = v.textValue;
-    return true;
+    return find(name, node, &StagedValue::textValue, out);
 }
 
 void StagedStore::commitTo(RetainedStore& store, int32_t node, bool persist) const {

@@ -42,7 +42,9 @@ public:
 
 private:
     void stage(StagedValue value);
-    bool find(const std::string& name, int32_t node, StagedValue& out) const;
+    /// Copies one field of the staged entry; false when nothing is staged.
+    template <class T>
+    bool find(const std::string& name, int32_t node, T StagedValue::*field, T& out) const;
 
     mutable SpinLock lock_;
     std::map<std::string, StagedValue> entries_;
