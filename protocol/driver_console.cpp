@@ -88,11 +88,12 @@ bool Protocol_XTOK::driverCommand(const std::vector<std::string>& words, const c
         }
         return consolePut(line, reply, size);
     }
-    // The queue commands take no lock: a console for commissioning, where
-    // the runtime is not reading tokens at the same time.
+    // The queue commands take no queueLock: a console for commissioning,
+    // where the runtime is not reading tokens at the same time. The receive
+    // task may push meanwhile; the queue guards itself against that.
     if (cmd == "get") {
-        const std::string* head = tokens_.head();
-        CopyReply(head ? head->c_str() : "", reply, size);
+        tokens_.withHead(
+            [&](const std::string* head) { CopyReply(head ? head->c_str() : "", reply, size); });
         return true;
     }
     if (cmd == "tokens_available") {
@@ -100,8 +101,9 @@ bool Protocol_XTOK::driverCommand(const std::vector<std::string>& words, const c
         return true;
     }
     if (cmd == "get_token_length") {
-        const std::string* head = tokens_.head();
-        CopyReply(std::to_string(head ? head->size() : 0).c_str(), reply, size);
+        const std::size_t length =
+            tokens_.withHead([](const std::string* head) { return head ? head->size() : 0; });
+        CopyReply(std::to_string(length).c_str(), reply, size);
         return true;
     }
     if (cmd == "token_ack") {

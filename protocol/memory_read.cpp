@@ -155,26 +155,31 @@ bool Protocol_XTOK::readSettingsType(XtokTag& tag, uint8_t* buffer) {
 bool Protocol_XTOK::readTokenType(XtokTag& tag, uint8_t* buffer) {
     HostLock lock(queueLock_);
     const std::string& name = tag.memoryType->name;
-    const std::string* head = tokens_.head();
     if (name == "rx_token") {
-        if (!head) {
-            buffer[0] = 0;
+        return tokens_.withHead([&](const std::string* head) {
+            if (!head) {
+                buffer[0] = 0;
+                return true;
+            }
+            if (static_cast<int64_t>(head->size()) >= tag.GetSize()) {
+                SetLastError(-1, "token too long");
+                return false;
+            }
+            // As a text: in raw mode a token with a zero byte reads as the
+            // part before it (hex mode exists for such tokens).
+            std::size_t length = std::strlen(head->c_str());
+            std::memcpy(buffer, head->c_str(), length + 1);
             return true;
-        }
-        if (static_cast<int64_t>(head->size()) >= tag.GetSize()) {
-            SetLastError(-1, "token too long");
-            return false;
-        }
-        // As a text: in raw mode a token with a zero byte reads as the part
-        // before it (hex mode exists for such tokens).
-        std::size_t length = std::strlen(head->c_str());
-        std::memcpy(buffer, head->c_str(), length + 1);
-    } else if (name == "rx_token_len") {
-        if (head) {
-            putInt(buffer, static_cast<int32_t>(head->size()));
-        } else {
-            buffer[0] = 0;  // only the first byte: runtimes rely on this
-        }
+        });
+    }
+    if (name == "rx_token_len") {
+        tokens_.withHead([&](const std::string* head) {
+            if (head) {
+                putInt(buffer, static_cast<int32_t>(head->size()));
+            } else {
+                buffer[0] = 0;  // only the first byte: runtimes rely on this
+            }
+        });
     } else if (name == "tokens_available") {
         putInt(buffer, tokens_.count());
     } else if (name == "token_ack" || name == "tx_token") {

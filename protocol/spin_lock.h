@@ -9,17 +9,29 @@
 #include <mutex>
 #include <string>
 
+#include "module/service_table.h"
+
 namespace xtok {
 
 class SpinLock {
 public:
     void lock() {
-        while (flag_.test_and_set(std::memory_order_acquire)) {
+        for (int spins = 0; flag_.test_and_set(std::memory_order_acquire); ++spins) {
+            // A holder preempted by a waiter of higher priority (the receive
+            // task) never runs again on a single core while the waiter only
+            // spins: past a short spin, the waiter sleeps through the host,
+            // which lets threads of any priority run.
+            if (spins >= kSpinsBeforeSleep) {
+                if (IMultiTask2* tasks = services().multiTask) {
+                    tasks->Sleep(1);
+                }
+            }
         }
     }
     void unlock() { flag_.clear(std::memory_order_release); }
 
 private:
+    static constexpr int kSpinsBeforeSleep = 1000;
     std::atomic_flag flag_ = ATOMIC_FLAG_INIT;
 };
 

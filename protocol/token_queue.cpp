@@ -16,8 +16,9 @@ constexpr std::size_t kFirstRing = 16;
 }  // namespace
 
 void TokenQueue::push(const char* bytes, std::size_t length, int32_t limit, bool hex) {
+    std::lock_guard<SpinLock> guard(guard_);
     if (static_cast<int64_t>(count_) >= limit) {
-        removeHead();
+        dropHead();
     }
     if (count_ == ring_.size()) {
         grow();
@@ -35,6 +36,11 @@ void TokenQueue::push(const char* bytes, std::size_t length, int32_t limit, bool
 }
 
 void TokenQueue::removeHead() {
+    std::lock_guard<SpinLock> guard(guard_);
+    dropHead();
+}
+
+void TokenQueue::dropHead() {
     if (count_ == 0) {
         return;
     }
@@ -47,6 +53,7 @@ void TokenQueue::removeHead() {
 }
 
 void TokenQueue::clear() {
+    std::lock_guard<SpinLock> guard(guard_);
     std::vector<std::string>().swap(ring_);
     head_ = 0;
     count_ = 0;
