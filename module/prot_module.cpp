@@ -77,6 +77,7 @@ int32_t ProtModule::Init(IServiceProvider* host) {
     table.driverInterface = take<IDriverInterface>(host, "IDriverInterface");
     table.smux = take<ISmux>(host, "ISmux");
     table.fastTimer = take<IFastTimer>(host, "IFastTimer");
+    table.held = true;
     host_ = host;
     initCount_ = 1;
     return 1;
@@ -112,6 +113,7 @@ void ProtModule::Exit() {
         releaseRequired(host_, table.serialFactory);
         releaseRequired(host_, table.socketFactory);
         releaseRequired(host_, table.cdsBuffer);
+        table.held = false;
         host_ = nullptr;
     }
     if (initCount_ != 0) {

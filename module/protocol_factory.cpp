@@ -27,7 +27,7 @@ IProtocol7* ProtocolFactory::CreateProtocol(const char* name) {
     }
     // A protocol takes its locks and port from the services Init acquired;
     // without them it could not run, so none is made.
-    if (!services().multiTask || !services().serialFactory) {
+    if (!services().held) {
         return nullptr;
     }
     try {

@@ -18,6 +18,9 @@ struct ServiceTable {
     IDriverInterface* driverInterface = nullptr;
     ISmux* smux = nullptr;
     IFastTimer* fastTimer = nullptr;
+    /// True between a successful Init and the last Exit. A failed Init leaves
+    /// the services it gave back in the table; this says they are not held.
+    bool held = false;
 };
 
 /// The process-wide table.

@@ -131,6 +131,23 @@ TEST(ModuleInit, FailedInitCanBeRetried) {
     EXPECT_EQ(good.outstanding(), 0);
 }
 
+TEST(ModuleInit, NoProtocolWithoutHeldServices) {
+    ProtocolFactory& factory = rootObject().factory();
+    EXPECT_EQ(factory.CreateProtocol("XTOK"), nullptr);  // before any Init
+    FakeHost refusing;
+    refusing.refuse("ICDSBuffer");
+    ProtModule module;
+    ASSERT_EQ(module.Init(&refusing), 0);
+    EXPECT_EQ(factory.CreateProtocol("XTOK"), nullptr);  // released services stay unused
+    FakeHost host;
+    ASSERT_EQ(module.Init(&host), 1);
+    IProtocol7* protocol = factory.CreateProtocol("XTOK");
+    EXPECT_NE(protocol, nullptr);
+    factory.DestroyProtocol(protocol);
+    module.Exit();
+    EXPECT_EQ(factory.CreateProtocol("XTOK"), nullptr);  // after the last Exit
+}
+
 TEST(ModuleInit, NullHostIsRefused) {
     ProtModule module;
     EXPECT_EQ(module.Init(nullptr), 0);
