@@ -6,13 +6,15 @@
 //   xtok_reader PLUGIN DEVICE COUNT [--wait signal|poll] [--poll-us N]
 //               [--batch N] [--stream-us N] [--idle-ms N]
 //
-// How it waits when the queue is empty:
+// How it waits between looks at tokens_available:
 //   signal (default)  on the host's task-yield signal (the receive task's
-//                     Sleep(0) after each pass), up to 10 ms; but while tokens
-//                     stream (a look finds --batch tokens or more, or the
-//                     next token arrives within --stream-us of starting to
-//                     wait) it looks every --poll-us instead, until a look
-//                     finds fewer than a quarter of --batch.
+//                     Sleep(0) after each pass), up to 10 ms, while tokens come
+//                     one at a time. They stream when a look finds --batch
+//                     tokens or more, or the next token arrives within
+//                     --stream-us of starting to wait; then it looks every
+//                     --poll-us (at once while a look finds 4 x --batch or
+//                     more), until a look finds fewer than a quarter of
+//                     --batch.
 //   poll              every --poll-us, like a runtime's fixed scan cycle.
 //
 // Prints "ready" once the port is open and the receive task runs, then one
@@ -133,7 +135,7 @@ int main(int argc, char** argv) {
     char text[64];
     uint32_t seenYields = tasks.taskYields();
     uint64_t lastDataNs = 0;
-    bool batching = false;
+    bool streaming = false;
     for (;;) {
         uint32_t n = 0;
         if (!protocol->ReadTag(available, &n)) {
@@ -163,20 +165,19 @@ int main(int argc, char** argv) {
             continue;
         }
         // Event-driven while tokens come one at a time, batched while they
-        // stream: a batch this large means waking for each token would cost
-        // more than the tokens themselves, so the next look is a scan cycle
-        // away; a small one means the line has calmed down.
-        if (n >= opt.batch) {
-            batching = true;
-        } else if (n < opt.batch / 4) {
-            batching = false;
-        }
-        if (batching) {
-            // Still behind (a look found several scan cycles' worth): look
-            // again at once.
-            if (n < 4 * opt.batch) {
-                sleepUs(opt.pollUs);
+        // stream: waking for each token would then cost more than the tokens
+        // themselves, so the next look is a scan cycle away.
+        if (streaming) {
+            if (n >= opt.batch / 4) {
+                // Several scan cycles' worth found: behind, look again at once.
+                if (n < 4 * opt.batch) {
+                    sleepUs(opt.pollUs);
+                }
+                continue;
             }
+            streaming = false;  // a whole cycle brought next to nothing
+        } else if (n >= opt.batch) {
+            streaming = true;
             continue;
         }
         // The host wakes us when a plug-in task ends a pass (its Sleep(0)
@@ -184,7 +185,9 @@ int main(int argc, char** argv) {
         const uint64_t waitFrom = bench::nowNs();
         seenYields = tasks.waitForTaskYield(seenYields, 10);
         if (n > 0 && bench::nowNs() - waitFrom < opt.streamUs * 1000ull) {
-            batching = true;  // the next token was already on its way
+            // The next token was already on its way: let them gather.
+            streaming = true;
+            sleepUs(opt.pollUs);
         }
     }
     std::printf("%s\n", check.json("xtokline").c_str());
