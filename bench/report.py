@@ -318,12 +318,12 @@ def main():
     parts = [table(summary, errors)]
     g = goals(summary, callgrind, syscalls)
     if g:
-        parts += ["#### Goals", "", g]
+        parts += ["#### Goals", g]
     m = micro_table(micro, callgrind)
     if m:
-        parts += ["#### The receive path alone (micro benchmark, memory line)", "", m]
+        parts += ["#### The receive path alone (micro benchmark, memory line)", m]
     if args.note:
-        parts += ["", args.note]
+        parts += [args.note]
     body = "\n\n".join(parts)
 
     os.makedirs(args.out, exist_ok=True)
