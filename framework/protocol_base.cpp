@@ -171,25 +171,24 @@ bool ProtocolBase::ReadMultiple(ITag* first, int32_t count, void* buffer, int32_
     return true;
 }
 
-// The stamp is taken once the access has finished.
-bool ProtocolBase::ReadTagStamped(ITag* tag, void* value, int64_t* stamp) {
-    if (!ReadTag(tag, value)) {
-        return false;
-    }
-    if (stamp) {
+namespace {
+
+// The stamp is taken once the access has finished, and only for a success.
+bool stampAfter(bool read, int64_t* stamp) {
+    if (read && stamp) {
         *stamp = NowStamp();
     }
-    return true;
+    return read;
+}
+
+}  // namespace
+
+bool ProtocolBase::ReadTagStamped(ITag* tag, void* value, int64_t* stamp) {
+    return stampAfter(ReadTag(tag, value), stamp);
 }
 
 bool ProtocolBase::ReadTagRawStamped(ITag* tag, void* buffer, int32_t size, int64_t* stamp) {
-    if (!ReadTagRaw(tag, buffer, size)) {
-        return false;
-    }
-    if (stamp) {
-        *stamp = NowStamp();
-    }
-    return true;
+    return stampAfter(ReadTagRaw(tag, buffer, size), stamp);
 }
 
 bool ProtocolBase::ReadMultipleStamped(ITag* first, int32_t count, void* buffer, int32_t* status,
@@ -205,13 +204,7 @@ bool ProtocolBase::ReadMultipleStamped(ITag* first, int32_t count, void* buffer,
 }
 
 bool ProtocolBase::ReadOptimizedStamped(ITag* tag, void* buffer, int32_t bits, int64_t* stamp) {
-    if (!ReadOptimized(tag, buffer, bits)) {
-        return false;
-    }
-    if (stamp) {
-        *stamp = NowStamp();
-    }
-    return true;
+    return stampAfter(ReadOptimized(tag, buffer, bits), stamp);
 }
 
 // ---- array items

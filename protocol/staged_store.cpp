@@ -17,30 +17,33 @@ void StagedStore::stage(StagedValue value) {
     entries_[key] = std::move(value);
 }
 
-void StagedStore::stageBool(const std::string& name, int32_t node, bool value) {
+namespace {
+
+StagedValue staged(int32_t kind, const std::string& name, int32_t node) {
     StagedValue v;
-    v.kind = 0;
+    v.kind = kind;
     v.name = name;
-    v.boolValue = value;
     v.node = node;
+    return v;
+}
+
+}  // namespace
+
+void StagedStore::stageBool(const std::string& name, int32_t node, bool value) {
+    StagedValue v = staged(0, name, node);
+    v.boolValue = value;
     stage(std::move(v));
 }
 
 void StagedStore::stageInt(const std::string& name, int32_t node, int32_t value) {
-    StagedValue v;
-    v.kind = 1;
-    v.name = name;
+    StagedValue v = staged(1, name, node);
     v.intValue = value;
-    v.node = node;
     stage(std::move(v));
 }
 
 void StagedStore::stageText(const std::string& name, int32_t node, const std::string& value) {
-    StagedValue v;
-    v.kind = 2;
-    v.name = name;
+    StagedValue v = staged(2, name, node);
     v.textValue = value;
-    v.node = node;
     stage(std::move(v));
 }
 
