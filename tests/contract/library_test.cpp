@@ -1,9 +1,10 @@
-// The built libxtok.so through dlopen and raw slot numbers only.
+// The built library as a runtime loads it and a configuration tool reads it:
+// one export, a static root whose module fills the library's own service
+// table, and the description block found in the file by its marker.
 #include <gtest/gtest.h>
+#include <zlib.h>
 
-#include <algorithm>
-#include <string>
-#include <vector>
+#include <regex>
 
 #include "tests/support/fake_host.h"
 #include "tests/support/plugin_library.h"
@@ -12,91 +13,72 @@
 namespace xtok::test {
 namespace {
 
-// Slot numbers of the contract, written out as a foreign runtime knows them.
-enum RootSlot { kRootGetInterface = 0, kRootRelease = 1 };
-enum FactorySlot {
-    kGetInterface = 1,
-    kGetName = 2,
-    kGetVersion = 3,
-    kCreate = 4,
-    kDestroyProtocol = 5
-};
-enum ModuleSlot { kInit = 4, kExit = 5, kErrorText = 6 };
-
-class Library : public ::testing::Test {
-protected:
-    void SetUp() override { ASSERT_TRUE(lib.loaded()) << lib.error(); }
-    PluginLibrary lib;
-};
-
-TEST_F(Library, ExportsOnlyTheEntry) {
+TEST(Library, ExportsOnlyTheEntry) {
     EXPECT_EQ(definedDynamicSymbols(XTOK_PLUGIN_PATH),
               std::vector<std::string>{"GetInterfaceFactory"});
 }
 
-TEST_F(Library, RootHandsOutFactoryAndModuleByName) {
-    void* root = lib.root();
-    ASSERT_NE(root, nullptr);
-    EXPECT_EQ(lib.root(), root);  // static: the same object every time
-    void* factory = callSlot<void*>(root, kRootGetInterface, "IProtocolFactory");
-    void* module = callSlot<void*>(root, kRootGetInterface, "IProtModule");
-    ASSERT_NE(factory, nullptr);
-    ASSERT_NE(module, nullptr);
-    EXPECT_EQ(callSlot<void*>(root, kRootGetInterface, "ProtocolFactory"), factory);
-    EXPECT_EQ(callSlot<void*>(root, kRootGetInterface, "ProtModule"), module);
-    EXPECT_EQ(callSlot<void*>(root, kRootGetInterface, "iprotmodule"), nullptr);
-    EXPECT_EQ(callSlot<void*>(root, kRootGetInterface, "IProtocol7"), nullptr);
-    callSlot<void>(root, kRootRelease);
-    EXPECT_EQ(callSlot<void*>(root, kRootGetInterface, "IProtModule"), module);
-}
-
-TEST_F(Library, FactoryIdentity) {
-    void* factory = lib.rootInterface("IProtocolFactory");
-    ASSERT_NE(factory, nullptr);
-    EXPECT_STREQ(callSlot<const char*>(factory, kGetName), "ProtFactoryInDLL");
-    EXPECT_EQ(callSlot<int32_t>(factory, kGetVersion), 100);
-    EXPECT_EQ(callSlot<void*>(factory, kGetInterface, "ProtocolFactory"), factory);
-    EXPECT_EQ(callSlot<void*>(factory, kGetInterface, "IProtocolFactory"), factory);
-    EXPECT_EQ(callSlot<void*>(factory, kGetInterface, "IProtModule"), nullptr);
-    EXPECT_EQ(callSlot<void*>(factory, kCreate, ""), nullptr);
-    EXPECT_EQ(callSlot<void*>(factory, kCreate, "NOPE"), nullptr);
-    callSlot<void>(factory, kDestroyProtocol, static_cast<void*>(nullptr));
-}
-
-TEST_F(Library, ModuleInitAndExitThroughSlots) {
-    void* module = lib.rootInterface("IProtModule");
-    ASSERT_NE(module, nullptr);
-    EXPECT_STREQ(callSlot<const char*>(module, kGetName), "ProtModule");
-    EXPECT_EQ(callSlot<int32_t>(module, kGetVersion), 100);
-    EXPECT_EQ(callSlot<void*>(module, kGetInterface, "ProtModule"), module);
-
-    FakeHost refusing;
-    refusing.refuse("ISocketFactory");
-    EXPECT_EQ(callSlot<int32_t>(module, kInit, static_cast<IServiceProvider*>(&refusing)), 0);
-    EXPECT_STREQ(callSlot<const char*>(module, kErrorText), "ISocketFactory not created");
-    EXPECT_EQ(refusing.outstanding(), 0);
-
-    FakeHost host;
-    IServiceProvider* provider = &host;
-    EXPECT_EQ(callSlot<int32_t>(module, kInit, provider), 1);
-    EXPECT_EQ(callSlot<int32_t>(module, kInit, provider), 1);
-    EXPECT_EQ(host.outstanding(), 9);
-    callSlot<void>(module, kExit);
-    EXPECT_EQ(host.outstanding(), 9);
-    callSlot<void>(module, kExit);
-    EXPECT_EQ(host.outstanding(), 0);
-}
-
-TEST(LibraryUnload, ReleasesTheServicesOfAnOpenInit) {
+// dlclose runs the library's static destructors (nothing else holds it): the
+// root's module gives back what one open Init took.
+TEST(Library, UnloadReleasesTheServicesOfAnOpenInit) {
     FakeHost host;
     {
         PluginLibrary lib;
-        ASSERT_TRUE(lib.loaded()) << lib.error();
+        void* root = lib.root();
         void* module = lib.rootInterface("IProtModule");
-        ASSERT_EQ(callSlot<int32_t>(module, kInit, static_cast<IServiceProvider*>(&host)), 1);
+        ASSERT_NE(module, nullptr) << lib.error();
+        callSlot<void>(root, 1);  // Release: the root stays
+        EXPECT_EQ(lib.root(), root);
+        ASSERT_EQ(callSlot<int32_t>(module, 4, static_cast<IServiceProvider*>(&host)), 1);
     }
-    // dlclose ran the library's static destructors (nothing else holds it).
     EXPECT_EQ(host.outstanding(), 0);
+}
+
+// Every match of `pattern`, its groups from the last to the first joined by
+// '=', the matches separated by spaces.
+std::string matches(const std::string& text, const char* pattern) {
+    std::string out;
+    std::regex re(pattern);
+    for (std::sregex_iterator it(text.begin(), text.end(), re), end; it != end; ++it) {
+        for (std::size_t group = it->size() - 1; group > 0; --group) {
+            out += (*it)[group].str() + (group > 1 ? "=" : " ");
+        }
+    }
+    return out;
+}
+
+// Header, size line, stream and end marker, each text ending in a zero byte.
+TEST(Library, DescriptionBlockInTheFile) {
+    const std::string file = readWholeFile(XTOK_PLUGIN_PATH);
+    const std::string header(
+        "<<ICOM_XML_START>>Name=XTOK?FullName=Xtokline?Version=106?Platform=PX40_WCE6", 77);
+    const std::size_t at = file.find(header);
+    ASSERT_NE(at, std::string::npos);
+    EXPECT_EQ(file.find("<<ICOM_XML_START>>", at + 1), std::string::npos);  // one copy only
+    const std::string sizeLine = file.c_str() + at + header.size();
+    const std::size_t streamAt = at + header.size() + sizeLine.size() + 1;
+    const uLong length = file.find("<<ICOM_XML_END>>", streamAt) - streamAt;
+    EXPECT_EQ(sizeLine, "compressedXML=" + std::to_string(length));
+    EXPECT_EQ(file.compare(streamAt + length, 17, std::string("<<ICOM_XML_END>>", 17)), 0);
+    std::string xml(1 << 16, '\0');
+    uLongf size = xml.size();
+    uLong used = length;
+    ASSERT_EQ(uncompress2(reinterpret_cast<Bytef*>(xml.data()), &size,
+                          reinterpret_cast<const Bytef*>(&file[streamAt]), &used),
+              Z_OK);
+    EXPECT_EQ(used, length);
+    xml.resize(size);
+    EXPECT_EQ(xml.rfind("<?xml version=", 0), 0u);
+    EXPECT_EQ(xml.rfind("</protocol_cfg>\n"), xml.size() - 16);
+    EXPECT_EQ(matches(xml, ">(\\w+)</(name|code)>"), "name=XTOK code=471 ");
+    EXPECT_EQ(matches(xml, "default=\"([^\"]*)\"[^>]*>(\\w+)\\s*<(?:/param|list)"),
+              "CfgVer=1 model=1 port=com1 baudrate=9600 parity=even bits=8 stopbits=1 "
+              "mode=RS-232 rx_prefix= rx_suffix= gap=0 tx_prefix= tx_suffix= hex_tokens=false "
+              "token_queue_size=100 autoConnect=true ");
+    EXPECT_EQ(matches(xml, ">(\\w+)</memtype>"),
+              "tx_token rx_token rx_token_len tokens_available token_ack connect SP_Baud SP_Bits "
+              "SP_Stop SP_Par SP_Mode SP_RxPrefix SP_RxSuffix SP_Gap SP_TxPrefix SP_TxSuffix "
+              "SP_HexTokens SP_TokenQueueSize SP_Done ");
 }
 
 }  // namespace

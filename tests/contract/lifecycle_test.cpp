@@ -1,0 +1,131 @@
+// The token protocol driven through the dlopen'ed library by slot numbers
+// only, as a panel runtime drives it; the library calls the host's services
+// by their slot numbers in turn.
+#include <gtest/gtest.h>
+
+#include <array>
+#include <string>
+
+#include "tests/support/fake_host.h"
+#include "tests/support/plugin_library.h"
+#include "tests/support/slot_call.h"
+
+namespace xtok::test {
+namespace {
+
+constexpr int kConfigure = 4, kCreateTag = 5, kStart = 8, kStop = 9, kReadTag = 10, kWriteTag = 11,
+              kLastErrorText = 21, kXmlDescription = 26, kDoCommand = 30;
+using Text = std::array<char, 64>;
+const uint8_t kOne = 1;
+
+// Module Init and one configured protocol, undone in reverse order.
+class Runtime {
+public:
+    Runtime(FakeHost& host, const std::string& parameters) {
+        if (module && callSlot<int32_t>(module, 4, static_cast<IServiceProvider*>(&host))) {
+            protocol = callSlot<void*>(factory, 4, "XTOK");
+        }
+        ok = protocol && call(kConfigure, (kLine + parameters).c_str());
+    }
+    ~Runtime() {
+        if (protocol) {
+            call(kStop);
+            callSlot<void>(factory, 5, protocol);
+        }
+        if (module) {
+            callSlot<void>(module, 5);
+        }
+    }
+    template <class R = bool, class... Args>
+    R call(int slot, Args... args) {
+        return callSlot<R>(protocol, slot, args...);
+    }
+    std::string error() { return protocol ? call<const char*>(kLastErrorText) : lib.error(); }
+    void* tag(const std::string& uri) { return call<void*>(kCreateTag, uri.c_str()); }
+    template <class T>  // uint32_t or Text
+    T read(void* tag) {
+        T value{};
+        EXPECT_TRUE(call(kReadTag, tag, static_cast<void*>(&value))) << error();
+        return value;
+    }
+
+    static inline const std::string kLine =
+        "CfgVer=1 model=1 port=com2 baudrate=19200 parity=odd bits=7 stopbits=2 mode=RS-485 ";
+    PluginLibrary lib;
+    void* module = lib.rootInterface("IProtModule");
+    void* factory = lib.rootInterface("IProtocolFactory");
+    void* protocol = nullptr;
+    bool ok = false;
+};
+
+TEST(Lifecycle, RefusedPortThenARetryAndTheConsole) {
+    FakeHost host;
+    Runtime rt(host, "");
+    ASSERT_TRUE(rt.ok) << rt.error();
+    host.serial().refuseOpen = true;
+    EXPECT_FALSE(rt.call(kStart));
+    EXPECT_EQ(rt.error(), "Can't open serial port");
+    host.serial().refuseOpen = false;
+    EXPECT_TRUE(rt.call(kStart)) << rt.error();
+    EXPECT_EQ(host.serial().configured(), (std::vector<LineSettings>{{19200, 2, 7, 2, 1}}));
+    Text reply{};
+    EXPECT_TRUE(rt.call(kDoCommand, "get_stat", reply.data(), int32_t{64}));
+    EXPECT_STREQ(reply.data(), "Connected");
+    // The protocol hands out the size line of the block, right after its header.
+    EXPECT_STREQ(rt.call<const char*>(kXmlDescription) - 77,
+                 "<<ICOM_XML_START>>Name=XTOK?FullName=Xtokline?Version=106?Platform=PX40_WCE6");
+}
+
+// The device frames a token; the panel polls, reads and acknowledges it, then
+// sends its answer, which reaches the line framed.
+TEST(Lifecycle, TokensBothWaysInRawAndHexMode) {
+    const struct {
+        const char* framing;
+        std::string deviceSends, token, answer, lineGets;
+    } rows[] = {
+        {"rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=0D0A", "\2HELLO\3", "HELLO", "WORLD",
+         "\2WORLD\r\n"},
+        {"rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03 hex_tokens=true",
+         std::string("\2\0\n\377A\3", 6), "000AFF41", "4142", "\2AB\3"},
+    };
+    for (const auto& row : rows) {
+        FakeHost host;
+        Runtime rt(host, row.framing);
+        ASSERT_TRUE(rt.ok && rt.call(kStart)) << rt.error();
+        void* available = rt.tag("0?tokens_available?unsignedInt");
+        host.serial().feed(row.deviceSends);
+        ASSERT_TRUE(host.serial().waitDrained());
+        EXPECT_EQ(rt.read<uint32_t>(available), 1u);
+        EXPECT_EQ(rt.read<uint32_t>(rt.tag("0?rx_token_len?unsignedInt")), row.token.size());
+        EXPECT_EQ(rt.read<Text>(rt.tag("0?rx_token?string-64")).data(), row.token);
+        EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?token_ack?boolean"), &kOne));
+        EXPECT_EQ(rt.read<uint32_t>(available), 0u);
+        Text answer{};
+        row.answer.copy(answer.data(), answer.size());
+        EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?tx_token?string-16"), answer.data()));
+        EXPECT_EQ(host.serial().written(), row.lineGets) << row.framing;
+    }
+}
+
+// The second session loads the library afresh: only the host's storage can
+// carry the settings over.
+TEST(Lifecycle, SettingsAppliedWithDoneSurviveARestart) {
+    FakeHost host;
+    {
+        Runtime rt(host, "");
+        ASSERT_TRUE(rt.ok && rt.call(kStart)) << rt.error();
+        const uint32_t rate = 57600;
+        EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?SP_Baud?unsignedInt"), &rate));
+        EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?SP_RxPrefix?string-10"), "02\0\0\0\0\0\0\0"));
+        EXPECT_EQ(host.serial().configured().size(), 1u);  // staged until SP_Done
+        EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?SP_Done?boolean"), &kOne));
+        EXPECT_EQ(host.serial().configured().back().baud, 57600);
+    }
+    Runtime rt(host, "");
+    ASSERT_TRUE(rt.ok && rt.call(kStart)) << rt.error();
+    EXPECT_EQ(host.serial().configured().back().baud, 57600);
+    EXPECT_STREQ(rt.read<Text>(rt.tag("0?SP_RxPrefix?string-10")).data(), "02");
+}
+
+}  // namespace
+}  // namespace xtok::test
