@@ -13,14 +13,11 @@
 namespace xtok::test {
 namespace {
 
-TEST(Library, ExportsOnlyTheEntry) {
-    EXPECT_EQ(definedDynamicSymbols(XTOK_PLUGIN_PATH),
-              std::vector<std::string>{"GetInterfaceFactory"});
-}
-
 // dlclose runs the library's static destructors (nothing else holds it): the
 // root's module gives back what one open Init took.
-TEST(Library, UnloadReleasesTheServicesOfAnOpenInit) {
+TEST(Library, OneExportAStaticRootAndUnloadReleasesAnOpenInit) {
+    EXPECT_EQ(definedDynamicSymbols(XTOK_PLUGIN_PATH),
+              std::vector<std::string>{"GetInterfaceFactory"});
     FakeHost host;
     {
         PluginLibrary lib;
@@ -66,8 +63,7 @@ TEST(Library, DescriptionBlockInTheFile) {
     ASSERT_EQ(uncompress2(reinterpret_cast<Bytef*>(xml.data()), &size,
                           reinterpret_cast<const Bytef*>(&file[streamAt]), &used),
               Z_OK);
-    EXPECT_EQ(used, length);
-    xml.resize(size);
+    xml.resize(used == length ? size : 0);  // the whole stream, nothing after it
     EXPECT_EQ(xml.rfind("<?xml version=", 0), 0u);
     EXPECT_EQ(xml.rfind("</protocol_cfg>\n"), xml.size() - 16);
     EXPECT_EQ(matches(xml, ">(\\w+)</(name|code)>"), "name=XTOK code=471 ");
