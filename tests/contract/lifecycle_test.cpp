@@ -20,6 +20,7 @@ const uint8_t kOne = 1;
 // Module Init and one configured protocol, undone in reverse order.
 class Runtime {
 public:
+    // Module slots 4 Init, 5 Exit; factory slots 4 CreateProtocol, 5 DestroyProtocol.
     Runtime(FakeHost& host, const std::string& parameters) {
         bool held = module && callSlot<int32_t>(module, 4, static_cast<IServiceProvider*>(&host));
         protocol = held ? callSlot<void*>(factory, 4, "XTOK") : nullptr;
