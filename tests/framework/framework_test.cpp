@@ -1,5 +1,5 @@
 // The framework as a protocol sees it: data type texts, the named
-// conversions, a tag's datum in its memory, and ProtocolBase
+// conversions, a tag's datum in its memory, the clock, and ProtocolBase
 // through a protocol over 16 bytes of memory (the slots a protocol leaves
 // alone, the error record, the tag list, reads and writes, the console).
 #include <gtest/gtest.h>
@@ -37,7 +37,18 @@ std::string parsed(const std::string& text) {
     return shown + " ";
 }
 
-TEST(DataTypes, ParseTheTypeOfATagAddressAndNameItBack) {
+// The bytes after conversion `name` (direction 0 reads, 1 writes), or
+// "refused"; a byte past the datum shows a conversion that overruns it.
+std::string conv(const char* type, const char* name, int direction, std::string bytes) {
+    DataType parsed;
+    EXPECT_TRUE(ParseDataType(type, parsed));
+    bytes += '|';
+    return ApplyConversion(parsed, reinterpret_cast<uint8_t*>(&bytes[0]), name, direction)
+               ? bytes
+               : "refused";
+}
+
+TEST(DataTypes, ParseTheTypeOfATagAddressThenConvertInPlaceOrRefuse) {
     // A dash makes an array; booleans count bits; a length is never negative.
     EXPECT_EQ(parsed(" \tunsignedShort ") + parsed("short-4 ( swap2 ,neg, )") + parsed("byte()") +
                   parsed("boolean-16") + parsed("byte-12abc") + parsed("byte--5"),
@@ -53,23 +64,7 @@ TEST(DataTypes, ParseTheTypeOfATagAddressAndNameItBack) {
         EXPECT_EQ(ElementSize(code), type.elementCode == 0 ? type.size : 0) << name;
         EXPECT_EQ(IsBitType(code), code == kBoolean || code == kBooleanArray) << name;
     }
-    EXPECT_EQ(DataTypeName(15, 8) + DataTypeName(27, 0) + DataTypeName(6, 99) + DataTypeName(28, 4),
-              "short-4object0unsignedShort??");
     EXPECT_EQ(DataTypeBit(0) + DataTypeBit(28) + ElementSize(28) + ElementCount(kShort, 8), 4u);
-}
-
-// The bytes after conversion `name` (direction 0 reads, 1 writes), or
-// "refused"; a byte past the datum shows a conversion that overruns it.
-std::string conv(const char* type, const char* name, int direction, std::string bytes) {
-    DataType parsed;
-    EXPECT_TRUE(ParseDataType(type, parsed));
-    bytes += '|';
-    return ApplyConversion(parsed, reinterpret_cast<uint8_t*>(&bytes[0]), name, direction)
-               ? bytes
-               : "refused";
-}
-
-TEST(Conversions, ConvertInPlaceOrRefuse) {
     EXPECT_EQ(conv("unsignedByte-2", "swapnibble", 1, "\x12\xf0") +
                   conv("short-2", "swap2", 0, "1234") + conv("int-2", "swap4", 1, "12345678"),
               "\x21\x0f|2143|43218765|");
@@ -83,12 +78,10 @@ TEST(Conversions, ConvertInPlaceOrRefuse) {
     EXPECT_EQ(conv("short", "bcd", 1, "\xd2\x04"s) + conv("int", "bcd", 1, "\xff\xe0\xf5\x05") +
                   conv("short", "bcd", 1, "\x10\x27") + conv("int64", "bcd", 1, "12345678"),
               "\x34\x12|\x99\x99\x99\x99|refusedrefused");  // 10000 has five digits
-    EXPECT_EQ(conv("byte", "neg", 1, "\x05") + conv("float", "neg", 0, "\0\0\x80\x3f"s) +
-                  conv("int64", "neg", 0, "\0\x01\0\0\0\0\0\0"s),
-              "\xfb|\0\0\x80\xbf|\0\xff\xff\xff\xff\xff\xff\xff|"s);
     // Only the first ceil(count / width) elements: devices rely on it.
-    EXPECT_EQ(conv("short-4", "neg", 0, "\x01\0\x02\0\x03\0\x04\0"s),
-              "\xff\xff\xfe\xff\x03\0\x04\0|"s);
+    EXPECT_EQ(conv("byte", "neg", 1, "\x05") + conv("float", "neg", 0, "\0\0\x80\x3f"s) +
+                  conv("short-4", "neg", 0, "\0\x01\x02\0\x03\0\x04\0"s),
+              "\xfb|\0\0\x80\xbf|\0\xff\xfe\xff\x03\0\x04\0|"s);
     EXPECT_EQ(conv("binary-2", "inv", 1, "\x0f\x01") + conv("boolean-3", "inv", 0, "\0\x01\x07"s) +
                   conv("unsignedShort", "neg", 0, "\x01\0"s) + conv("int", "inv", 0, "1234"),
               "\xf0\xfe|\x01\0\0|refusedrefused"s);
@@ -145,6 +138,35 @@ TEST(TagBase, ConvertsInListOrderAndPlacesItsDatumInItsMemoryType) {
               "2/2/1/ 6/3/8/ 10/1/4/ 0/5/1/ 3/0/2/ ");
 }
 
+// "year-month-day weekday hh:mm:ss.mmm" when the stamp converts back to itself.
+std::string brokenDown(int64_t stamp) {
+    SystemTime t;
+    int64_t back = -1;
+    char text[64] = "refused";
+    if (StampToSystemTime(stamp, t) && SystemTimeToStamp(t, back) && back == stamp) {
+        std::snprintf(text, sizeof text, "%04d-%02d-%02d %d %02d:%02d:%02d.%03d", t.year, t.month,
+                      t.day, t.dayOfWeek, t.hour, t.minute, t.second, t.milliseconds);
+    }
+    return text + " "s;
+}
+
+TEST(Clock, StampsAndBrokenDownTimesBothWays) {
+    EXPECT_EQ(brokenDown(-1) + brokenDown(951782400000 + 3723004),
+              "1969-12-31 3 23:59:59.999 2000-02-29 2 01:02:03.004 ");
+    EXPECT_EQ(brokenDown(-kFileTimeEpochOffsetMs) + brokenDown(253402300799999),
+              "1601-01-01 1 00:00:00.000 9999-12-31 5 23:59:59.999 ");
+    EXPECT_EQ(brokenDown(-kFileTimeEpochOffsetMs - 1) + brokenDown(INT64_MAX), "refused refused ");
+    int64_t stamp = -1;
+    for (SystemTime bad :
+         {SystemTime{2001, 2, 0, 29}, SystemTime{2000, 13, 0, 1}, SystemTime{1600, 12, 0, 31},
+          SystemTime{30828, 1, 0, 1}, SystemTime{2000, 1, 0, 1, 24},
+          SystemTime{2000, 1, 0, 1, 0, 0, 0, 1000}}) {
+        EXPECT_FALSE(SystemTimeToStamp(bad, stamp)) << bad.year << "-" << bad.month;
+    }
+}
+
+const char* const kFieldNames[] = {"address", "datatype", nullptr};
+
 // Tag addresses read "byte[.bit]?datatype". A failed access leaves the error
 // record to the framework.
 class Memory : public ProtocolBase {
@@ -159,28 +181,26 @@ public:
     const char* GetDisplayName() override { return ""; }
     int32_t GetTagProperty(ITag*) override { return 0; }
     int32_t GetMaxAccessTime(int32_t) override { return 12; }
+    const char* const* GetUriFieldNames() override { return kFieldNames; }
+    // An empty address stands for a tag that cannot be allocated.
     ITag* NewTag(const char* uri) override {
-        TagBase* tag = refuseTags ? nullptr : new TagBase;
         const char* type = std::strchr(uri, '?');
+        TagBase* tag = *uri ? new TagBase : nullptr;
         if (tag) {
             tag->uri = uri;
-            tag->memoryType = &bytes;
             tag->valid = type && std::sscanf(uri, "%d.%d", &tag->address, &tag->index) > 0 &&
                          ParseDataType(type + 1, tag->dataType);
         }
         return AdoptNewTag(tag);
     }
-    bool ReadTagRaw(ITag* tag, void* buffer, int32_t size) override {
-        std::memcpy(buffer, memory + tag->GetByteAddress(), size);
-        return !failReads;
+    bool ReadTagRaw(ITag* t, void* b, int32_t n) override {
+        return !failReads && std::memcpy(b, at(t), n);
     }
-    bool WriteTag(ITag* tag, const void* value) override {
-        return tag->Convert(value, memory + tag->GetByteAddress(), 1);
-    }
+    bool WriteTag(ITag* t, const void* v) override { return t->Convert(v, at(t), 1); }
+    char* at(ITag* t) { return memory + t->GetByteAddress(); }
 
     char memory[16] = {};
-    bool failReads = false, refuseTags = false;
-    MemoryType bytes;
+    bool failReads = false;
 };
 
 // Calls `slot` with null pointers and zeros.
@@ -206,8 +226,6 @@ const Default kDefaults[] = {
     {call<bool, P, P>, 0, "", {16}},
     {call<bool, P, I>, 0, "", {54}},
     {call<bool, P, I, P>, 0, "", {17, 32}},
-    {call<bool, P, I, P, P>, 0, "", {33}},
-    {call<bool, P, I, P, P, P>, 0, "", {73}},
     {call<bool, P, P, I>, 0, "", {40}},
     {call<I, I, P>, 0, "", {31}},
     {call<bool, P, P>, 0, "Optimized writing not supported", {13}},
@@ -250,26 +268,42 @@ protected:
     Memory protocol;
 };
 
-TEST_F(ProtocolBaseTest, AnswersItsNamesAndKeepsItsTags) {
+TEST_F(ProtocolBaseTest, AnswersItsNamesKeepsOrdersAndSplitsItsTags) {
     EXPECT_EQ(protocol.GetInterface("IProtocol4"), static_cast<IProtocol7*>(&protocol));
     EXPECT_FALSE(protocol.GetInterface("IProtocol8") || protocol.GetInterface(nullptr));
     protocol.SetInstanceName("");  // no instance name: the protocol's
     EXPECT_EQ(protocol.GetInstanceName() + "/"s + protocol.GetNameFor(5, 6), "MEM/MEM");
 
     ITag* kept = tag("1?byte");
-    protocol.refuseTags = true;
-    EXPECT_EQ(tag("1?byte") ? "made" : error(), "0 Can't allocate Tag");
+    EXPECT_EQ(tag("") ? "made" : error(), "0 Can't allocate Tag");
     EXPECT_EQ(protocol.Tags(), std::list<ITag*>{kept});
     protocol.DeleteTag(kept);
     protocol.DeleteTag(nullptr);
-    auto* owned = new Memory;
-    owned->CreateTag("0?byte");
-    callSlot<void*>(static_cast<IProtocol7*>(owned), 0, 1u);
-    EXPECT_TRUE(protocol.Tags().empty());  // the protocol's end takes its tags along
+    EXPECT_TRUE(protocol.Tags().empty());
+    ITag* first = tag("0?short");
+    ITag* second = tag("2?short");
+    ITag* bits = tag("0?boolean-3");
+    // TagFollows(a, b): whether b lies immediately before a.
+    EXPECT_EQ(
+        std::vector<bool>({protocol.TagLess(first, second), protocol.TagLess(second, first),
+                           protocol.TagFollows(second, first), protocol.TagFollows(first, second),
+                           protocol.TagFollows(tag("0.3?boolean"), bits),
+                           protocol.TagFollows(tag("0.4?boolean"), bits)}),
+        std::vector<bool>({1, 0, 1, 0, 1, 0}));
+    std::string fields;
+    for (int32_t index : {0, 1, 2, -1}) {
+        int32_t length = -7;
+        const char* name = protocol.GetUriFieldName(index);
+        const char* text = protocol.GetUriField(first, index, &length);
+        fields +=
+            (name ? name : "-") + " "s + (text ? text : "-") + " " + std::to_string(length) + ",";
+    }
+    EXPECT_EQ(fields, "address 0?short 1,datatype short 5,- - -7,- - -7,");
+    EXPECT_EQ(protocol.GetUriFieldCount() * 10 + protocol.GetUriFieldIndex("datatype"), 21);
+    EXPECT_EQ(protocol.GetUriFieldIndex("Address") + protocol.GetUriFieldIndex(nullptr), -2);
 }
 
 TEST_F(ProtocolBaseTest, ReadsConvertStampAfterASuccessAndRewriteWholeArrays) {
-    EXPECT_EQ(error(), "1 ");
     protocol.WriteObject(nullptr, nullptr);
     std::memcpy(protocol.memory + 4, "\x78\x56\x34\x12", 4);
     int32_t value = 0;
@@ -278,18 +312,10 @@ TEST_F(ProtocolBaseTest, ReadsConvertStampAfterASuccessAndRewriteWholeArrays) {
     EXPECT_TRUE(protocol.ReadTagRawStamped(tag("0?int"), &value, 4, &stamps[1]) &&
                 protocol.ReadTagStamped(tag("4?int(swap4)"), &value, &stamps[0]));
     EXPECT_TRUE(std::min(stamps[0], stamps[1]) >= before && stamps[0] < before + 2000);
-    EXPECT_EQ(value, 0x78563412);
-    EXPECT_EQ(error(), "-1 write object not supported");  // a success clears nothing
+    // 0x78563412, and a success clears no error.
+    EXPECT_EQ(std::to_string(value) + error(), "2018915346-1 write object not supported");
     EXPECT_FALSE(protocol.ReadTag(tag("4?short(swap4)"), &value));
     EXPECT_EQ(error(), "-9 read conversion error");
-    protocol.failReads = true;
-    stamps[0] = stamps[1] = -5;
-    EXPECT_FALSE(protocol.ReadTagStamped(tag("0?int"), &value, &stamps[0]) ||
-                 protocol.ReadTagRawStamped(tag("0?int"), &value, 4, &stamps[1]) ||
-                 protocol.ReadOptimizedStamped(tag("0?int"), &value, 32, &stamps[2]));
-    EXPECT_EQ(stamps[0] + stamps[1] + stamps[2], -15);
-
-    protocol.failReads = false;
     ITag* array = tag("4?short-4");
     int16_t item = 0x0102;
     EXPECT_FALSE(protocol.ReadArrayItem(tag("0?short"), 0, &item));
@@ -302,31 +328,15 @@ TEST_F(ProtocolBaseTest, ReadsConvertStampAfterASuccessAndRewriteWholeArrays) {
                 protocol.ReadArrayItem(array, 1, &item));
     EXPECT_EQ(std::string(protocol.memory + 4, 8) + std::to_string(item),
               "\x78\x56\x34\x12\0\0\x02\x01"s + std::to_string(0x1234));
+    protocol.failReads = true;
+    stamps[0] = stamps[1] = -5;
+    EXPECT_FALSE(protocol.ReadTagStamped(tag("0?int"), &value, &stamps[0]) ||
+                 protocol.ReadTagRawStamped(tag("0?int"), &value, 4, &stamps[1]) ||
+                 protocol.ReadOptimizedStamped(tag("0?int"), &value, 32, &stamps[2]));
+    EXPECT_EQ(stamps[0] + stamps[1] + stamps[2], -15);
 }
 
-TEST_F(ProtocolBaseTest, OrdersTagsAndFindsTheirAddressFields) {
-    ITag* first = tag("0?short");
-    ITag* second = tag("2?short");
-    ITag* bits = tag("0?boolean-3");
-    // TagFollows(a, b): whether b lies immediately before a.
-    EXPECT_EQ(
-        std::vector<bool>({protocol.TagLess(first, second), protocol.TagLess(second, first),
-                           protocol.TagFollows(second, first), protocol.TagFollows(first, second),
-                           protocol.TagFollows(tag("0.3?boolean"), bits),
-                           protocol.TagFollows(tag("0.4?boolean"), bits)}),
-        std::vector<bool>({1, 0, 1, 0, 1, 0}));
-    std::string fields;  // of the address text; the field names are the protocol's (none here)
-    for (int32_t index : {0, 1, 2, -1}) {
-        int32_t length = -7;
-        const char* text = protocol.GetUriField(first, index, &length);
-        fields += (text ? text : "-") + " "s + std::to_string(length) + ",";
-    }
-    EXPECT_EQ(fields, "0?short 1,short 5,- -7,- -7,");
-    EXPECT_TRUE(protocol.GetUriFieldCount() == 0 && !protocol.GetUriFieldName(0) &&
-                protocol.GetUriFieldIndex("address") == -1);
-}
-
-TEST_F(ProtocolBaseTest, ConsoleFixedRepliesAreCutAtTheBufferWithoutTerminator) {
+TEST_F(ProtocolBaseTest, ConsoleRepliesAreCutAtTheBufferWithoutTerminator) {
     EXPECT_EQ(run("help", 5) + run("help", -3) + run("Help") + run("helpx"), "help ########--");
     protocol.ReadObject(nullptr, nullptr);
     EXPECT_EQ(run("lasterror") + run("xml"), reply("read object not supported") + reply(""));
@@ -335,31 +345,20 @@ TEST_F(ProtocolBaseTest, ConsoleFixedRepliesAreCutAtTheBufferWithoutTerminator) 
     EXPECT_EQ(run("deletetags", 4), "########");
     EXPECT_TRUE(protocol.Tags().empty());
 
-    std::string info =  // no host services held
-        "Protocol: MEM (42) v.3\nImplementation: Memory v.7\nProtocolBase v.100\nProtLib v.200\n";
-    EXPECT_EQ(run("info", 400), info + '\0' + std::string(400 - info.size() - 1 + 4, '#'));
-    EXPECT_EQ(run("info", 10), info.substr(0, 10) + "####");
-    EXPECT_EQ(protocol.GetInfo(nullptr, 8) + protocol.GetInfo(&info[0], 0), 0);
-}
-
-TEST_F(ProtocolBaseTest, ConsoleReadsAndWritesHexOrExplains) {
+    EXPECT_EQ(run("info", 10), "Protocol: ####");
     std::memcpy(protocol.memory + 8, "\x12\xAB\x00\x7F", 4);
     // Two digits a byte while 5 bytes of room are left, then what fits of "\n\0".
     EXPECT_EQ(run("read 8?byte-4", 16) + run("read 8?byte-4", 8),
               "12ab007f\n\0##########12ab\n\0######"s);
     EXPECT_EQ(run("read 8?byte-4", 5) + run("read 8?byte-4", 1) + run("read 8?byte-4", 0),
               "12\n\0#####\n########"s);
-    const std::string missing = "error: missing parameter (URI string)\n";
-    const std::string missingData = "error: missing parameters (URI string + data)\n";
     for (auto [command, text] :
-         {std::pair<const char*, std::string>{"read", missing},
+         {std::pair<const char*, std::string>{"read", "error: missing parameter (URI string)\n"},
           {"read 0", "Tag URI error: 0 - "},
-          {"write 0?byte", missingData},
+          {"write 0?byte", "error: missing parameters (URI string + data)\n"},
           {"write 0?byte 0A0B", "error: incorrect length of data to write\n"},
           {"write 0?byte-2 0g12", "error: incorrect hex data\n"},
-          {"write 0?short(swap4) 0102", "Tag URI error: 0 - "},  // the last error
-          {"write 3?byte-3 a9F0fA", "written ok\n"},
-          {"write 3?byte-0 ", "written ok\n"}}) {
+          {"write 3?byte-3 a9F0fA", "written ok\n"}}) {
         EXPECT_EQ(run(command), reply(text)) << command;
     }
     protocol.failReads = true;
