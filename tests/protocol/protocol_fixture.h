@@ -1,4 +1,4 @@
-// A token protocol made by the plug-in's factory over a fake host, with
+// A token protocol made by the plug-in's factory over the test host, with
 // helpers to configure and start it, to read and write its memory types
 // through tags, to talk to its console and to play bytes on its line.
 #pragma once
@@ -6,7 +6,6 @@
 #include <gtest/gtest.h>
 
 #include <chrono>
-#include <cstdint>
 #include <cstring>
 #include <functional>
 #include <map>
@@ -19,7 +18,6 @@
 #include "module/interface_factory.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/module_session.h"
-#include "xtokline/protocol.h"
 
 namespace xtok::test {
 
@@ -29,12 +27,9 @@ inline const std::string kBaseConfig =
 
 /// Bytes from hex pairs, blanks between them optional: "02 41" or "0241".
 inline std::string hexBytes(const std::string& hex) {
-    std::string out;
-    std::string digits;
+    std::string digits, out;
     for (char c : hex) {
-        if (c != ' ') {
-            digits.push_back(c);
-        }
+        digits += c == ' ' ? "" : std::string(1, c);
     }
     for (std::size_t i = 0; i + 1 < digits.size(); i += 2) {
         out.push_back(static_cast<char>(std::stoi(digits.substr(i, 2), nullptr, 16)));
@@ -42,9 +37,9 @@ inline std::string hexBytes(const std::string& hex) {
     return out;
 }
 
-/// Polls `condition` until it holds or `timeoutMs` passed; true when it held.
-inline bool eventually(const std::function<bool()>& condition, int timeoutMs = 5000) {
-    auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(timeoutMs);
+/// Polls `condition` until it holds or five seconds passed; true when it held.
+inline bool eventually(const std::function<bool()>& condition) {
+    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(5);
     while (!condition()) {
         if (std::chrono::steady_clock::now() > deadline) {
             return false;
@@ -55,26 +50,19 @@ inline bool eventually(const std::function<bool()>& condition, int timeoutMs = 5
 }
 
 class ProtocolFixture : public ::testing::Test {
-protected:
+public:
     void SetUp() override {
-        prepareHost();
         session_ = std::make_unique<ModuleSession>(host);
         create();
     }
-
     void TearDown() override {
         destroy();
         session_.reset();
     }
-
-    /// Runs before the module takes the host's services.
-    virtual void prepareHost() {}
-
     void create() {
         protocol = rootObject().factory().CreateProtocol("XTOK");
         ASSERT_NE(protocol, nullptr);
     }
-
     /// Stops and destroys the protocol, as a runtime does.
     void destroy() {
         tags_.clear();
@@ -84,156 +72,118 @@ protected:
             protocol = nullptr;
         }
     }
-
     bool configure(const std::string& extra = "") {
-        std::string text = extra.empty() ? kBaseConfig : kBaseConfig + " " + extra;
-        return protocol->Configure(text.c_str());
+        return protocol->Configure((kBaseConfig + " " + extra).c_str());
     }
-
     /// Configures with the base keys and `extra`, then starts.
-    void start(const std::string& extra = "") {
-        ASSERT_TRUE(configure(extra)) << error();
-        ASSERT_TRUE(protocol->Start()) << error();
+    bool start(const std::string& extra = "") {
+        EXPECT_TRUE(configure(extra)) << error();
+        return protocol->Start();
     }
-
     std::string error() const { return protocol->GetLastErrorText(); }
     int32_t code() const { return protocol->GetLastErrorCode(); }
 
-    /// A tag made once per address (the runtime's CreateTag), kept for the test.
+    /// A tag made once per address, kept for the test.
     ITag* tag(const std::string& uri) {
         auto it = tags_.find(uri);
-        if (it != tags_.end()) {
-            return it->second;
-        }
-        ITag* made = protocol->CreateTag(uri.c_str());
+        ITag* made = it != tags_.end() ? it->second : tags_[uri] = protocol->CreateTag(uri.c_str());
         EXPECT_NE(made, nullptr) << uri << ": " << error();
-        tags_[uri] = made;
         return made;
     }
-
-    static std::string intUri(const std::string& type) { return "0?" + type + "?unsignedInt"; }
-    static std::string byteUri(const std::string& type) { return "0?" + type + "?unsignedByte"; }
-    static std::string boolUri(const std::string& type) { return "0?" + type + "?boolean"; }
-    static std::string textUri(const std::string& type, int size) {
-        return "0?" + type + "?string-" + std::to_string(size);
+    /// A tag's value read through ReadTag as `size` bytes; none when it fails.
+    std::optional<std::string> read(const std::string& uri, std::size_t size) {
+        std::vector<char> buffer(size + 16, '\0');
+        ITag* t = tag(uri);
+        return t && protocol->ReadTag(t, buffer.data())
+                   ? std::optional(std::string(buffer.data(), size))
+                   : std::nullopt;
     }
-
-    // Reads through the runtime's ReadTag; empty when the read fails.
     std::optional<int32_t> readInt(const std::string& type) {
+        auto bytes = read("0?" + type + "?unsignedInt", 4);
         int32_t value = 0;
-        return read(tag(intUri(type)), &value, sizeof value) ? std::optional<int32_t>(value)
-                                                             : std::nullopt;
+        return bytes ? (std::memcpy(&value, bytes->data(), 4), std::optional(value)) : std::nullopt;
     }
-    std::optional<int> readByte(const std::string& type) {
-        uint8_t value = 0;
-        return read(tag(byteUri(type)), &value, 1) ? std::optional<int>(value) : std::nullopt;
+    std::optional<int> readByte(const std::string& type, const char* dataType = "unsignedByte") {
+        auto bytes = read("0?" + type + "?" + dataType, 1);
+        return bytes ? std::optional<int>(static_cast<uint8_t>((*bytes)[0])) : std::nullopt;
     }
     std::optional<bool> readBool(const std::string& type) {
-        uint8_t value = 0;
-        return read(tag(boolUri(type)), &value, 1) ? std::optional<bool>(value != 0) : std::nullopt;
+        auto value = readByte(type, "boolean");
+        return value ? std::optional<bool>(*value != 0) : std::nullopt;
     }
     std::optional<std::string> readText(const std::string& type, int size = 64) {
-        std::vector<char> value(static_cast<std::size_t>(size) + 1, '\0');
-        if (!read(tag(textUri(type, size)), value.data(), size)) {
-            return std::nullopt;
-        }
-        return std::string(value.data());
+        auto bytes = read("0?" + type + "?string-" + std::to_string(size), size);
+        return bytes ? std::optional(std::string(bytes->c_str())) : std::nullopt;
     }
-
+    bool write(const std::string& uri, const void* value) {
+        ITag* t = tag(uri);
+        return t && protocol->WriteTag(t, value);
+    }
     bool writeInt(const std::string& type, int32_t value) {
-        return protocol->WriteTag(tag(intUri(type)), &value);
+        return write("0?" + type + "?unsignedInt", &value);
     }
-    bool writeByte(const std::string& type, uint8_t value) {
-        return protocol->WriteTag(tag(byteUri(type)), &value);
+    bool writeByte(const std::string& type, uint8_t value, const char* dataType = "unsignedByte") {
+        return write("0?" + type + "?" + dataType, &value);
     }
     bool writeBool(const std::string& type, bool value) {
-        uint8_t byte = value ? 1 : 0;
-        return protocol->WriteTag(tag(boolUri(type)), &byte);
+        return writeByte(type, value ? 1 : 0, "boolean");
     }
     bool writeText(const std::string& type, const std::string& text, int size = 64) {
-        std::vector<char> value(static_cast<std::size_t>(size), '\0');
+        std::string value(static_cast<std::size_t>(size), '\0');
         std::memcpy(value.data(), text.data(), std::min(text.size(), value.size()));
-        return protocol->WriteTag(tag(textUri(type, size)), value.data());
+        return write("0?" + type + "?string-" + std::to_string(size), value.data());
     }
 
     /// The console's reply up to its first zero, and its result.
     std::string command(const std::string& line, bool* result = nullptr) {
         std::vector<char> reply(8192, '\0');
-        bool ok =
-            protocol->DoCommand(line.c_str(), reply.data(), static_cast<int32_t>(reply.size()));
+        const bool ok = protocol->DoCommand(line.c_str(), reply.data(), 8192);
         if (result) {
             *result = ok;
         }
-        return std::string(reply.data());
+        return reply.data();
     }
 
-    /// Plays `script` on the line: hex byte pairs, '|' for a silence (one
-    /// read that times out). A silence is added at the end, so a token that
-    /// only the gap ends is complete too. Returns once the receive task has
-    /// read all of it.
+    /// Plays hex byte pairs on the line, '|' standing for a silence (one read
+    /// that times out), and a silence at the end; returns once the receive
+    /// task has read all of it.
     void play(const std::string& script) {
-        std::string run;
-        auto flush = [&] {
-            if (!run.empty()) {
-                host.serial().feed(hexBytes(run));
-                run.clear();
-            }
-        };
-        for (char c : script) {
-            if (c == '|') {
-                flush();
-                host.serial().silence();
-            } else {
-                run.push_back(c);
-            }
+        std::size_t at = 0;
+        for (std::size_t bar; (bar = script.find('|', at)) != std::string::npos; at = bar + 1) {
+            host.serial().feed(hexBytes(script.substr(at, bar - at)));
+            host.serial().silence();
         }
-        flush();
+        host.serial().feed(hexBytes(script.substr(at)));
         host.serial().silence();
         ASSERT_TRUE(host.serial().waitDrained()) << "the receive task did not read the script";
     }
-
-    /// Waits until the receive task is in a pass that began after this call.
-    /// A pass takes the framing and the gap when it begins, so changes made
-    /// before apply to whatever is played next.
+    /// Waits until the receive task is in a pass begun after this call: a
+    /// pass takes the framing and the gap when it begins.
     void settle() {
-        // The first read seen on the empty line may belong to a pass begun
-        // earlier; it ends that pass, so the next one belongs to a new pass.
         ASSERT_TRUE(host.serial().waitDrained());
         ASSERT_TRUE(host.serial().waitDrained());
     }
-
     /// Every queued token, oldest first, each read through rx_token and then
     /// acknowledged; the queue is empty afterwards.
-    std::vector<std::string> takeTokens(int size = 4096) {
+    std::vector<std::string> takeTokens() {
         std::vector<std::string> out;
-        std::optional<int32_t> count = readInt("tokens_available");
-        EXPECT_TRUE(count.has_value()) << error();
-        for (int32_t i = 0; count && i < *count; ++i) {
-            std::optional<std::string> token = readText("rx_token", size);
-            EXPECT_TRUE(token.has_value()) << error();
-            out.push_back(token.value_or("?"));
+        for (int32_t n = readInt("tokens_available").value_or(0); n > 0; --n) {
+            out.push_back(readText("rx_token", 4096).value_or("?"));
             EXPECT_TRUE(writeBool("token_ack", true)) << error();
         }
         return out;
+    }
+    /// The port's settings as the protocol reports them.
+    std::string settingsText() {
+        char text[64] = {};
+        protocol->GetSerialSettings(text, sizeof text);
+        return text;
     }
 
     FakeHost host;
     IProtocol7* protocol = nullptr;
 
 private:
-    bool read(ITag* t, void* value, std::size_t size) {
-        if (!t) {
-            return false;
-        }
-        // ReadTag writes exactly the tag's value size; pad for safety.
-        std::vector<uint8_t> buffer(size + 16, 0);
-        if (!protocol->ReadTag(t, buffer.data())) {
-            return false;
-        }
-        std::memcpy(value, buffer.data(), size);
-        return true;
-    }
-
     std::unique_ptr<ModuleSession> session_;
     std::map<std::string, ITag*> tags_;
 };

@@ -1,6 +1,6 @@
 // The in-process test host: a service provider whose services can each be
-// present or refused, and which records every GetService and ReleaseService
-// in order.
+// present, refused or replaced, and which records every GetService and
+// ReleaseService in order.
 #pragma once
 
 #include <cstdint>

@@ -1,6 +1,5 @@
-// Tasks on real threads and recursive locks that record every lock and
-// unlock with the calling thread, so tests can check which locks an
-// operation takes and in which order.
+// Tasks on real threads and recursive locks, with the faults a host can
+// have: no task made, a stop that times out.
 #pragma once
 
 #include <atomic>
@@ -16,12 +15,9 @@
 
 namespace xtok::test {
 
-class FakeMultiTask;
-
 class FakeTask final : public ITask {
 public:
-    FakeTask(IRunnable* body, int32_t priority, int32_t flags)
-        : body_(body), priority_(priority), flags_(flags) {}
+    explicit FakeTask(IRunnable* body) : body_(body) {}
     ~FakeTask();
     void* Destroy(unsigned) override { return this; }
     int32_t Reserved1() override { return 0; }
@@ -32,13 +28,9 @@ public:
     void requestStop() { stop_ = true; }
     /// Waits up to `ms` for Run to return.
     bool waitEnded(int32_t ms);
-    void join();
-    int32_t priority() const { return priority_; }
-    int32_t flags() const { return flags_; }
 
 private:
     IRunnable* body_;
-    int32_t priority_, flags_;
     std::atomic<bool> stop_{false};
     std::thread thread_;
     std::mutex mutex_;
@@ -46,24 +38,14 @@ private:
     bool ended_ = false;
 };
 
-struct LockEvent {
-    int mutex;  ///< 1-based number in creation order
-    bool lock;  ///< lock (or a successful TryLock) / unlock
-    std::thread::id thread;
-};
-
 class FakeMutex final : public IMutex {
 public:
-    FakeMutex(FakeMultiTask& owner, int number) : owner_(owner), number_(number) {}
     void* Destroy(unsigned) override { return this; }
-    void Lock() override;
-    bool TryLock() override;
-    void Unlock() override;
-    int number() const { return number_; }
+    void Lock() override { mutex_.lock(); }
+    bool TryLock() override { return mutex_.try_lock(); }
+    void Unlock() override { mutex_.unlock(); }
 
 private:
-    FakeMultiTask& owner_;
-    int number_;
     std::recursive_mutex mutex_;
 };
 
@@ -82,33 +64,24 @@ public:
     int32_t Reserved11() override { return 0; }
     ITask* CreateTask(IRunnable* body, int32_t priority, int32_t flags) override;
 
-    // Faults to inject.
-    std::atomic<bool> refuseTasks{false};
-    std::atomic<bool> stopTimesOut{false};
+    std::atomic<bool> refuseTasks{false}, stopTimesOut{false};
 
-    /// Lock events in order (kept up to a bound, so a long run cannot eat memory).
-    std::vector<LockEvent> lockEvents() const;
-    void clearLockEvents();
-    void record(const LockEvent& event);
-
-    int mutexesCreated() const;
+    /// "CreateTask 3 0", "StopTask 1000", "CreateMutex 0", "DestroyMutex", in order.
+    std::vector<std::string> calls() const;
     int mutexesAlive() const;
-    int tasksCreated() const;
-    /// The most recently created task, or null.
+    /// The most recently made task, or null.
     FakeTask* lastTask() const;
-    std::vector<int32_t> sleeps() const;
-    std::vector<std::string> calls() const;  ///< "StopTask 1000", "CreateTask 3 0", ...
+    /// Sleeps of 10 ms or more: a receive task idling.
+    long idleSleeps() const { return idleSleeps_.load(); }
 
 private:
     void log(const std::string& line);
 
     mutable std::mutex mutex_;
     std::vector<std::unique_ptr<FakeMutex>> mutexes_;
-    std::vector<int> destroyed_;
     std::vector<std::unique_ptr<FakeTask>> tasks_;
-    std::vector<LockEvent> events_;
-    std::vector<int32_t> sleeps_;
     std::vector<std::string> calls_;
+    std::atomic<long> idleSleeps_{0};
 };
 
 }  // namespace xtok::test

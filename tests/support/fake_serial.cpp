@@ -5,78 +5,65 @@
 namespace xtok::test {
 
 namespace {
-constexpr std::size_t kMaxTimeouts = 10000;
-}
 
-bool FakeSerialPort::Configure(int32_t baud, int32_t parity, int32_t bits, int32_t stop,
-                               int32_t mode) {
-    std::lock_guard<std::mutex> lock(factory_.mutex_);
-    factory_.configured_.push_back({baud, parity, bits, stop, mode});
-    return !factory_.failConfigure;
-}
+enum Event { kSilence = 256, kError, kHangUp };
 
-bool FakeSerialPort::ReadByte(uint8_t* destination, int32_t timeoutMs, int32_t) {
-    return factory_.read(destination, timeoutMs);
-}
-
-bool FakeSerialPort::Write(const uint8_t* data, int32_t length, int32_t) {
-    std::lock_guard<std::mutex> lock(factory_.mutex_);
-    factory_.writes_.emplace_back(reinterpret_cast<const char*>(data),
-                                  static_cast<std::size_t>(length > 0 ? length : 0));
-    return !factory_.failWrite;
-}
+}  // namespace
 
 ISerialPort* FakeSerialFactory::Open(const char* name) {
     std::lock_guard<std::mutex> lock(mutex_);
-    names_.push_back(name ? name : "");
+    record_.names.push_back(name ? name : "");
     if (refuseOpen) {
         return nullptr;
     }
-    ++opens_;
-    ++open_;
-    hungUp_ = false;  // a port opened again has a live line
-    ports_.push_back(std::make_unique<FakeSerialPort>(*this, names_.back()));
-    return ports_.back().get();
+    ++record_.opens;
+    ++record_.open;
+    record_.hungUp = false;  // a port opened again has a live line
+    return this;
 }
 
 void FakeSerialFactory::Close(ISerialPort*) {
     std::lock_guard<std::mutex> lock(mutex_);
-    ++closes_;
-    --open_;
+    ++record_.closes;
+    --record_.open;
 }
 
-void FakeSerialFactory::feed(const std::string& bytes) {
-    feedBytes(std::vector<uint8_t>(bytes.begin(), bytes.end()));
-}
-
-void FakeSerialFactory::feedBytes(const std::vector<uint8_t>& bytes) {
+bool FakeSerialFactory::Configure(int32_t baud, int32_t parity, int32_t bits, int32_t stop,
+                                  int32_t mode) {
     std::lock_guard<std::mutex> lock(mutex_);
-    for (uint8_t b : bytes) {
-        script_.push_back({Kind::Byte, b});
-    }
+    record_.configured.push_back({baud, parity, bits, stop, mode});
+    return !failConfigure;
+}
+
+bool FakeSerialFactory::Write(const uint8_t* data, int32_t length, int32_t) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    record_.writes.emplace_back(reinterpret_cast<const char*>(data), length > 0 ? length : 0);
+    return !failWrite;
+}
+
+void FakeSerialFactory::push(const std::vector<int>& events) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    script_.insert(script_.end(), events.begin(), events.end());
     readAfterEmpty_ = false;
     changed_.notify_all();
+}
+
+// All at once: a reader must not take a pause between two bytes for a silence.
+void FakeSerialFactory::feed(const std::string& bytes) {
+    push(std::vector<int>(reinterpret_cast<const uint8_t*>(bytes.data()),
+                          reinterpret_cast<const uint8_t*>(bytes.data()) + bytes.size()));
 }
 
 void FakeSerialFactory::silence() {
-    std::lock_guard<std::mutex> lock(mutex_);
-    script_.push_back({Kind::Silence, 0});
-    readAfterEmpty_ = false;
-    changed_.notify_all();
+    push({kSilence});
 }
 
 void FakeSerialFactory::readError() {
-    std::lock_guard<std::mutex> lock(mutex_);
-    script_.push_back({Kind::Error, 0});
-    readAfterEmpty_ = false;
-    changed_.notify_all();
+    push({kError});
 }
 
 void FakeSerialFactory::hangUp() {
-    std::lock_guard<std::mutex> lock(mutex_);
-    script_.push_back({Kind::HangUp, 0});
-    readAfterEmpty_ = false;
-    changed_.notify_all();
+    push({kHangUp});
 }
 
 std::size_t FakeSerialFactory::pending() const {
@@ -84,42 +71,28 @@ std::size_t FakeSerialFactory::pending() const {
     return script_.size();
 }
 
-bool FakeSerialFactory::read(uint8_t* destination, int32_t timeoutMs) {
+bool FakeSerialFactory::ReadByte(uint8_t* destination, int32_t timeoutMs, int32_t) {
     std::unique_lock<std::mutex> lock(mutex_);
-    ++reads_;
-    if (timeouts_.size() < kMaxTimeouts) {
-        timeouts_.push_back(timeoutMs);
-    }
-    if (hungUp_) {
-        // Fails at once; what is still scripted waits for the port to be
-        // opened again.
-        if (script_.empty()) {
-            readAfterEmpty_ = true;
-            changed_.notify_all();
-        }
-        return false;
-    }
-    if (script_.empty()) {
-        readAfterEmpty_ = true;
+    ++record_.reads;
+    record_.lastTimeout = timeoutMs;
+    if (script_.empty() || record_.hungUp) {
+        // Hung up, a read fails at once and the script waits for a new open.
+        // Otherwise a time-out comes within a millisecond, not after
+        // timeoutMs, unless the test feeds more meanwhile.
+        readAfterEmpty_ = script_.empty();
         changed_.notify_all();
-        // Nothing scripted: a time-out, answered within a millisecond (not
-        // after timeoutMs), unless the test feeds more meanwhile. The short
-        // wait keeps an idle reader from flooding the lock log.
-        changed_.wait_for(lock, std::chrono::milliseconds(timeoutMs > 0 ? 1 : 0),
-                          [this] { return !script_.empty(); });
-        if (script_.empty()) {
+        if (record_.hungUp || !changed_.wait_for(lock, std::chrono::milliseconds(1),
+                                                 [this] { return !script_.empty(); })) {
             return false;
         }
     }
-    Event event = script_.front();
+    const int event = script_.front();
     script_.pop_front();
-    if (event.kind == Kind::HangUp) {
-        hungUp_ = true;
-    }
-    if (event.kind != Kind::Byte) {
+    record_.hungUp = record_.hungUp || event == kHangUp;
+    if (event >= kSilence) {
         return false;
     }
-    *destination = event.byte;
+    *destination = static_cast<uint8_t>(event);
     return true;
 }
 
@@ -130,58 +103,17 @@ bool FakeSerialFactory::waitDrained(int timeoutMs) {
                              [this] { return script_.empty() && readAfterEmpty_; });
 }
 
-int FakeSerialFactory::opens() const {
+LineRecord FakeSerialFactory::record() const {
     std::lock_guard<std::mutex> lock(mutex_);
-    return opens_;
-}
-
-int FakeSerialFactory::closes() const {
-    std::lock_guard<std::mutex> lock(mutex_);
-    return closes_;
-}
-
-bool FakeSerialFactory::isOpen() const {
-    std::lock_guard<std::mutex> lock(mutex_);
-    return open_ > 0;
-}
-
-std::vector<LineSettings> FakeSerialFactory::configured() const {
-    std::lock_guard<std::mutex> lock(mutex_);
-    return configured_;
+    return record_;
 }
 
 std::string FakeSerialFactory::written() const {
-    std::lock_guard<std::mutex> lock(mutex_);
     std::string all;
-    for (const auto& w : writes_) {
-        all += w;
+    for (const std::string& write : writes()) {
+        all += write;
     }
     return all;
-}
-
-std::vector<std::string> FakeSerialFactory::writes() const {
-    std::lock_guard<std::mutex> lock(mutex_);
-    return writes_;
-}
-
-std::vector<std::string> FakeSerialFactory::openedNames() const {
-    std::lock_guard<std::mutex> lock(mutex_);
-    return names_;
-}
-
-std::vector<int32_t> FakeSerialFactory::readTimeouts() const {
-    std::lock_guard<std::mutex> lock(mutex_);
-    return timeouts_;
-}
-
-long FakeSerialFactory::reads() const {
-    std::lock_guard<std::mutex> lock(mutex_);
-    return reads_;
-}
-
-bool FakeSerialFactory::hungUp() const {
-    std::lock_guard<std::mutex> lock(mutex_);
-    return hungUp_;
 }
 
 }  // namespace xtok::test

@@ -1,7 +1,6 @@
-// A scriptable serial factory: ports can be refused, Configure can fail,
-// configure arguments and written bytes are recorded, and ReadByte plays a
-// script of bytes, silences and hang-ups, answering a time-out at once
-// instead of waiting.
+// A scriptable serial line: ports can be refused, settings and writes fail on
+// demand and are recorded, and reads play a script of bytes, silences, read
+// errors and hang-ups, answering a time-out at once instead of waiting.
 #pragma once
 
 #include <atomic>
@@ -25,12 +24,45 @@ struct LineSettings {
     }
 };
 
-class FakeSerialFactory;
+/// What happened on the line so far.
+struct LineRecord {
+    int opens = 0, closes = 0, open = 0;
+    long reads = 0;
+    int32_t lastTimeout = 0;  ///< of the most recent read
+    bool hungUp = false;
+    std::vector<std::string> names;  ///< asked to open, refused ones too
+    std::vector<LineSettings> configured;
+    std::vector<std::string> writes;  ///< one entry per write
+};
 
-class FakeSerialPort final : public ISerialPort {
+class FakeSerialFactory final : public FakeService<ISerialFactory>, private ISerialPort {
 public:
-    FakeSerialPort(FakeSerialFactory& factory, std::string name)
-        : factory_(factory), name_(std::move(name)) {}
+    FakeSerialFactory() : FakeService("ISerialFactory", 300) {}
+
+    ISerialPort* Open(const char* name) override;
+    void Close(ISerialPort* port) override;
+
+    // The script the next reads play, one event per read.
+    void feed(const std::string& bytes);
+    void silence();    ///< a time-out
+    void readError();  ///< fails at once, as a port that reports a line error does
+    /// From this event on every read fails at once, until the port is opened again.
+    void hangUp();
+    std::size_t pending() const;
+    /// Waits (bounded) until the script is read and one more read found it
+    /// empty: the reader has acted on all of it.
+    bool waitDrained(int timeoutMs = 5000);
+
+    std::atomic<bool> refuseOpen{false}, failConfigure{false}, failWrite{false};
+
+    LineRecord record() const;
+    bool isOpen() const { return record().open > 0; }
+    std::vector<LineSettings> configured() const { return record().configured; }
+    std::vector<std::string> writes() const { return record().writes; }
+    std::string written() const;
+
+private:
+    // The one port this line opens, shared by every Open.
     void* Destroy(unsigned) override { return this; }
     int32_t Reserved1() override { return 0; }
     int32_t Reserved2() override { return 0; }
@@ -39,75 +71,13 @@ public:
     int32_t Reserved5() override { return 0; }
     bool ReadByte(uint8_t* destination, int32_t timeoutMs, int32_t flags) override;
     bool Write(const uint8_t* data, int32_t length, int32_t flags) override;
-    const std::string& name() const { return name_; }
-
-private:
-    FakeSerialFactory& factory_;
-    std::string name_;
-};
-
-class FakeSerialFactory final : public FakeService<ISerialFactory> {
-public:
-    FakeSerialFactory() : FakeService("ISerialFactory", 300) {}
-
-    ISerialPort* Open(const char* name) override;
-    void Close(ISerialPort* port) override;
-
-    // The script the next ReadByte calls play, whichever port is open.
-    void feed(const std::string& bytes);  ///< bytes arrive, one per read
-    void feedBytes(const std::vector<uint8_t>& bytes);
-    void silence();  ///< one read answers a time-out
-    /// One read fails at once, as a port that reports a line error does.
-    void readError();
-    /// The device hangs up: from this event on every read fails at once,
-    /// until the port is opened again.
-    void hangUp();
-    /// Scripted events not read yet.
-    std::size_t pending() const;
-    /// Waits (bounded) until every scripted event has been read and one
-    /// more read found the script empty: the reader has acted on all of it.
-    bool waitDrained(int timeoutMs = 5000);
-
-    // Faults to inject.
-    std::atomic<bool> refuseOpen{false};
-    std::atomic<bool> failConfigure{false};
-    std::atomic<bool> failWrite{false};
-
-    // What happened.
-    int opens() const;
-    int closes() const;
-    bool isOpen() const;
-    std::vector<LineSettings> configured() const;
-    std::string written() const;              ///< all bytes written, in order
-    std::vector<std::string> writes() const;  ///< one entry per Write call
-    std::vector<std::string> openedNames() const;
-    /// Time-out arguments seen by ReadByte, most recent last (bounded).
-    std::vector<int32_t> readTimeouts() const;
-    /// ReadByte calls so far (not bounded like readTimeouts).
-    long reads() const;
-    bool hungUp() const;
-
-private:
-    friend class FakeSerialPort;
-    enum class Kind { Byte, Silence, Error, HangUp };
-    struct Event {
-        Kind kind;
-        uint8_t byte;
-    };
-    bool read(uint8_t* destination, int32_t timeoutMs);
+    void push(const std::vector<int>& events);
 
     mutable std::mutex mutex_;
     std::condition_variable changed_;
-    std::deque<Event> script_;
+    std::deque<int> script_;  ///< a byte, or one of the events below
     bool readAfterEmpty_ = false;
-    bool hungUp_ = false;
-    std::vector<std::unique_ptr<FakeSerialPort>> ports_;
-    int open_ = 0, opens_ = 0, closes_ = 0;
-    std::vector<LineSettings> configured_;
-    std::vector<std::string> writes_;
-    std::vector<std::string> names_;
-    std::vector<int32_t> timeouts_;
-    long reads_ = 0;
+    LineRecord record_;
 };
 
 }  // namespace xtok::test

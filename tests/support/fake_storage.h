@@ -1,5 +1,5 @@
-// In-memory permanent storage with a call log, with or without the
-// extended interface, and with read or write failures on demand.
+// In-memory permanent storage, with or without the extended interface, and
+// with read or write failures on demand.
 #pragma once
 
 #include <atomic>
@@ -7,7 +7,6 @@
 #include <mutex>
 #include <string>
 #include <utility>
-#include <vector>
 
 #include "tests/support/fake_service.h"
 
@@ -30,27 +29,25 @@ public:
     int32_t Reserved13() override { return 0; }
     bool ReadTextTo(const char* section, const char* key, char* buffer, int32_t size) override;
 
-    // Settings and faults.
     std::atomic<bool> extended{true};  ///< answers "IPermanentStorage2"
     std::atomic<bool> failWrites{false};
     std::atomic<bool> failReads{false};  ///< ReadTextTo fails, other reads give empty values
 
-    /// Values are kept as text; "section/key" → text.
+    /// Values as text, by section and key.
     void put(const std::string& section, const std::string& key, const std::string& text);
     bool has(const std::string& section, const std::string& key) const;
     std::string get(const std::string& section, const std::string& key) const;
-    std::vector<std::string> calls() const;  ///< e.g. "IsStored XTOK baud", "WriteInt XTOK gap 5"
-    void clearCalls();
+    /// Writes asked for, failed ones too.
+    int writes() const { return writes_.load(); }
 
 private:
-    using Key = std::pair<std::string, std::string>;
-    void log(const std::string& line);
-    std::string value(const char* section, const char* key);
+    bool write(const char* section, const char* key, const std::string& text);
+    std::string read(const char* section, const char* key);
 
     mutable std::mutex mutex_;
-    std::map<Key, std::string> values_;
-    std::vector<std::string> calls_;
+    std::map<std::pair<std::string, std::string>, std::string> values_;
     std::string lastText_;
+    std::atomic<int> writes_{0};
 };
 
 }  // namespace xtok::test
