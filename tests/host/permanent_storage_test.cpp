@@ -57,26 +57,6 @@ TEST_F(Storage, KeepsEachTypeAcrossReopening) {
     }
 }
 
-TEST_F(Storage, MissingValuesReadAsZeroAndAreNotStored) {
-    auto storage = open();
-    ASSERT_NE(storage, nullptr);
-    ASSERT_TRUE(storage->WriteInt("XTOK", "baud", 9600));
-    struct Name {
-        const char* section;
-        const char* key;
-    };
-    for (const Name& name : {Name{"XTOK", "bits"}, Name{"xtok", "baud"}, Name{nullptr, "baud"}}) {
-        EXPECT_FALSE(storage->IsStored(name.section, name.key));
-        EXPECT_EQ(storage->ReadInt(name.section, name.key), 0);
-        EXPECT_FALSE(storage->ReadBool(name.section, name.key));
-        EXPECT_STREQ(storage->ReadText(name.section, name.key), "");
-        char buffer[8] = "unset";
-        EXPECT_FALSE(storage->ReadTextTo(name.section, name.key, buffer, sizeof buffer));
-    }
-    EXPECT_FALSE(storage->WriteInt(nullptr, "baud", 1));
-    EXPECT_FALSE(storage->WriteText("XTOK", "text", nullptr));
-}
-
 TEST_F(Storage, ReadTextToNeedsRoomForTheZero) {
     auto storage = open();
     ASSERT_NE(storage, nullptr);
@@ -95,16 +75,6 @@ TEST_F(Storage, ReadTextToNeedsRoomForTheZero) {
     EXPECT_FALSE(extended->ReadTextTo("XTOK", "suffix", nullptr, 8));
 }
 
-TEST_F(Storage, ReadTextIsEachThreadsOwn) {
-    auto storage = open();
-    ASSERT_NE(storage, nullptr);
-    ASSERT_TRUE(storage->WriteText("XTOK", "a", "first"));
-    ASSERT_TRUE(storage->WriteText("XTOK", "b", "second"));
-    const char* mine = storage->ReadText("XTOK", "a");
-    std::thread([&] { EXPECT_STREQ(storage->ReadText("XTOK", "b"), "second"); }).join();
-    EXPECT_STREQ(mine, "first");
-}
-
 TEST(StorageFile, UnusableFilesAreRefusedWithTheReason) {
     test::TempDir dir;
     std::ofstream(dir.file("garbage")) << std::string(4096, 'g');
@@ -120,19 +90,6 @@ TEST(StorageFile, UnusableFilesAreRefusedWithTheReason) {
         EXPECT_EQ(PermanentStorage::open(path, error), nullptr) << path;
         EXPECT_NE(error.find(reason), std::string::npos) << path << ": " << error;
     }
-}
-
-TEST(StorageFile, DefaultPathFollowsTheUsersStateDirectory) {
-    std::string home = std::getenv("HOME") ? std::getenv("HOME") : "";
-    setenv("HOME", "/home/op", 1);
-    setenv("XDG_STATE_HOME", "/state", 1);
-    EXPECT_EQ(defaultStoragePath(), "/state/xtokline/retained.sqlite3");
-    setenv("XDG_STATE_HOME", "", 1);
-    EXPECT_EQ(defaultStoragePath(), "/home/op/.local/state/xtokline/retained.sqlite3");
-    unsetenv("XDG_STATE_HOME");
-    unsetenv("HOME");
-    EXPECT_EQ(defaultStoragePath(), "");
-    setenv("HOME", home.c_str(), 1);
 }
 
 }  // namespace

@@ -97,13 +97,6 @@ TEST_F(Pty, CarriesLongStreamsOfEveryByteValueBothWays) {
     device.join();
 }
 
-TEST_F(Pty, SilentLineTimesOut) {
-    uint8_t byte = 0;
-    Clock::time_point start = Clock::now();
-    EXPECT_FALSE(port_->ReadByte(&byte, 30, 0));
-    EXPECT_GE(millisecondsSince(start), 29);
-}
-
 TEST_F(Pty, OneReadServesABurstAndHangUpEndsReadsWithoutSpinning) {
     ASSERT_EQ(write(master_, "abc", 3), 3);
     uint8_t byte = 0;
@@ -163,39 +156,6 @@ TEST_F(Pty, RefusesSettingsItCannotApplyAndSaysWhy) {
     EXPECT_EQ(notices_.count(slave_), 7);
     termios unchanged = lineSettings();
     EXPECT_EQ(cfgetospeed(&unchanged), B19200);
-}
-
-TEST_F(Pty, Rs485WithoutDriverSupportWorksAndIsSaidOncePerDevice) {
-    EXPECT_TRUE(port_->Configure(9600, 0, 8, 1, 1));
-    factory_.Close(port_);
-    port_ = factory_.Open(slave_.c_str());
-    ASSERT_NE(port_, nullptr);
-    EXPECT_TRUE(port_->Configure(9600, 0, 8, 1, 3));
-    EXPECT_TRUE(port_->Configure(9600, 0, 8, 1, 2));  // RS-422 asks nothing of the driver
-    EXPECT_EQ(notices_.count("RS-485"), 1);
-}
-
-TEST_F(Pty, SecondOpenOfALineIsRefusedAsBusyUntilTheFirstCloses) {
-    EXPECT_EQ(factory_.Open(slave_.c_str()), nullptr);
-    EXPECT_EQ(notices_.count("in use by another program"), 1);
-    factory_.Close(port_);
-    port_ = factory_.Open(slave_.c_str());
-    EXPECT_NE(port_, nullptr);
-}
-
-TEST_F(Pty, OpensByAnAssignedComName) {
-    factory_.Close(port_);  // the line is taken while the fixture holds it
-    port_ = nullptr;
-    ComMap ports;
-    std::string error;
-    ASSERT_TRUE(ports.assign("com4=" + slave_, error));
-    SerialFactory factory(ports, notices_.sink());
-    ISerialPort* port = factory.Open("COM4");
-    ASSERT_NE(port, nullptr);
-    ASSERT_EQ(write(master_, "z", 1), 1);
-    uint8_t byte = 0;
-    EXPECT_TRUE(port->ReadByte(&byte, kPatienceMs, 0) && byte == 'z');
-    factory.Close(port);
 }
 
 TEST(SerialFactory, TellsWhyAPortDoesNotOpen) {

@@ -99,6 +99,17 @@ TEST_F(Session, ScriptedRunReadsWritesAndWatches) {
     EXPECT_EQ(device_->tokens(), std::vector<std::string>{"HELLO"});
 }
 
+// SP_Done keeps the settings in the state file: the next run starts with them.
+TEST_F(Session, RetainedSettingsSurviveARestart) {
+    Finished done = runTool(run({"--exec",
+                                 "tag write 0?SP_Baud?unsignedInt 19200; tag write "
+                                 "0?SP_RxSuffix?string-8 0D0A; tag write 0?SP_Done?boolean 1"}));
+    EXPECT_EQ(done.status, 0) << done.err;
+    done =
+        runTool(run({"--exec", "tag read 0?SP_Baud?unsignedInt; tag read 0?SP_RxSuffix?string-8"}));
+    EXPECT_EQ(done.out, "19200\n\"0D0A\"\n") << done.err;
+}
+
 TEST_F(Session, CtrlCEndsAWatchAndTheScriptGoesOn) {
     device_.reset();
     DeviceOptions reader;

@@ -11,19 +11,6 @@
 namespace xtok::tools {
 namespace {
 
-const char* const kMemoryTypes[] = {
-    "tx_token",    "rx_token",     "rx_token_len",      "tokens_available", "token_ack",
-    "connect",     "SP_Baud",      "SP_Bits",           "SP_Stop",          "SP_Par",
-    "SP_Mode",     "SP_RxPrefix",  "SP_RxSuffix",       "SP_Gap",           "SP_TxPrefix",
-    "SP_TxSuffix", "SP_HexTokens", "SP_TokenQueueSize", "SP_Done"};
-
-std::string fileBytes(const std::string& path) {
-    std::ifstream file(path, std::ios::binary);
-    std::ostringstream content;
-    content << file.rdbuf();
-    return content.str();
-}
-
 std::string deflated(const std::string& text) {
     uLongf size = compressBound(text.size());
     std::string out(size, '\0');
@@ -41,29 +28,6 @@ std::string block(const std::string& compressed, std::size_t claimed, const std:
                7) +
            "<<ICOM_XML_START>>Name=T?Version=1" + '\0' +
            "compressedXML=" + std::to_string(claimed) + '\0' + compressed + end + '\0' + "tail";
-}
-
-TEST(Describe, TheRealPluginDescribesItsNineteenMemoryTypes) {
-    DescriptionBlock found;
-    std::string xml;
-    std::string error;
-    ASSERT_TRUE(findDescription(fileBytes(XTOK_PLUGIN_PATH), found, error)) << error;
-    using Field = std::pair<std::string, std::string>;
-    EXPECT_EQ(found.header, (std::vector<Field>{{"Name", "XTOK"},
-                                                {"FullName", "Xtokline"},
-                                                {"Version", "106"},
-                                                {"Platform", "PX40_WCE6"}}));
-    ASSERT_TRUE(inflateDescription(found.compressed, xml, error)) << error;
-    EXPECT_EQ(xml.rfind("<?xml version=", 0), 0u);
-    EXPECT_EQ(xml.substr(xml.size() - 16), "</protocol_cfg>\n");
-    std::ostringstream summary;
-    ASSERT_TRUE(summarizeDescription(found, xml, summary, error)) << error;
-    std::string text = summary.str();
-    std::string memoryTypes = text.substr(text.find("Memory types (19):"));
-    for (const char* name : kMemoryTypes) {
-        EXPECT_NE(memoryTypes.find(std::string("  ") + name + " "), std::string::npos) << name;
-    }
-    EXPECT_NE(text.find("Parameters (16):"), std::string::npos) << text;
 }
 
 TEST(Describe, RefusesDamagedBlocksWithAReason) {
