@@ -7,7 +7,17 @@ include(CMakePackageConfigHelpers)
 
 set(XTOK_CMAKE_DIR ${CMAKE_INSTALL_LIBDIR}/cmake/xtokline)
 
-install(TARGETS xtok LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
+# A Windows DLL goes to bin/ beside the programs that load it, as Windows
+# finds DLLs; elsewhere the plug-in goes to lib/.
+install(TARGETS xtok LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}
+    RUNTIME DESTINATION ${CMAKE_INSTALL_BINDIR})
+if(WIN32)
+    set(XTOK_PLUGIN_DIR ${CMAKE_INSTALL_BINDIR})
+    set(XTOK_PLUGIN_FILE xtok.dll)
+else()
+    set(XTOK_PLUGIN_DIR ${CMAKE_INSTALL_LIBDIR})
+    set(XTOK_PLUGIN_FILE ${CMAKE_SHARED_LIBRARY_PREFIX}xtok${CMAKE_SHARED_LIBRARY_SUFFIX})
+endif()
 if(XTOK_BUILD_HOST)
     install(TARGETS xtok-host RUNTIME DESTINATION ${CMAKE_INSTALL_BINDIR})
 endif()
@@ -21,7 +31,7 @@ install(EXPORT xtoklineTargets NAMESPACE xtokline:: DESTINATION ${XTOK_CMAKE_DIR
 configure_package_config_file(cmake/xtoklineConfig.cmake.in
     ${CMAKE_CURRENT_BINARY_DIR}/xtoklineConfig.cmake
     INSTALL_DESTINATION ${XTOK_CMAKE_DIR}
-    PATH_VARS CMAKE_INSTALL_LIBDIR)
+    PATH_VARS XTOK_PLUGIN_DIR)
 write_basic_package_version_file(${CMAKE_CURRENT_BINARY_DIR}/xtoklineConfigVersion.cmake
     COMPATIBILITY SameMajorVersion ARCH_INDEPENDENT)
 install(FILES

@@ -1,7 +1,11 @@
 #include "framework/clock.h"
 
+#ifdef _WIN32
+#include <windows.h>
+#else
 #include <chrono>
 #include <ctime>
+#endif
 
 namespace xtok {
 namespace {
@@ -44,6 +48,47 @@ int64_t floorDiv(int64_t a, int64_t b) {
     return a / b - (a % b < 0);
 }
 
+}  // namespace
+
+#ifdef _WIN32
+
+namespace {
+
+// A file time (100 ns units since 1601) in milliseconds.
+int64_t fileTimeMs(const FILETIME& time) {
+    ULARGE_INTEGER units;
+    units.LowPart = time.dwLowDateTime;
+    units.HighPart = time.dwHighDateTime;
+    return static_cast<int64_t>(units.QuadPart / 10000);
+}
+
+int64_t systemTimeMs(const SYSTEMTIME& time) {
+    FILETIME file{};
+    SystemTimeToFileTime(&time, &file);
+    return fileTimeMs(file);
+}
+
+}  // namespace
+
+int64_t NowStamp() {
+    FILETIME now;
+    GetSystemTimeAsFileTime(&now);
+    return fileTimeMs(now) - kFileTimeEpochOffsetMs;
+}
+
+int64_t LocalOffset() {
+    // The two readings straddle a tick at worst: the offset is then off by
+    // that tick, as on the panel's own runtime.
+    SYSTEMTIME local, utc;
+    GetLocalTime(&local);
+    GetSystemTime(&utc);
+    return systemTimeMs(local) - systemTimeMs(utc);
+}
+
+#else
+
+namespace {
+
 int64_t msOfBrokenDown(const std::tm& t) {
     return daysFromCivil(t.tm_year + 1900, t.tm_mon + 1, t.tm_mday) * kMsPerDay +
            (t.tm_hour * 3600 + t.tm_min * 60 + t.tm_sec) * int64_t{1000};
@@ -52,7 +97,7 @@ int64_t msOfBrokenDown(const std::tm& t) {
 }  // namespace
 
 int64_t NowStamp() {
-    // The system clock counts from 1970-01-01 UTC on every platform we build for.
+    // The system clock counts from 1970-01-01 UTC.
     using namespace std::chrono;
     return duration_cast<milliseconds>(system_clock::now().time_since_epoch()).count();
 }
@@ -63,15 +108,12 @@ int64_t LocalOffset() {
     std::time_t now = std::time(nullptr);
     std::tm local{};
     std::tm utc{};
-#ifdef _WIN32
-    localtime_s(&local, &now);
-    gmtime_s(&utc, &now);
-#else
     localtime_r(&now, &local);
     gmtime_r(&now, &utc);
-#endif
     return msOfBrokenDown(local) - msOfBrokenDown(utc);
 }
+
+#endif
 
 int64_t ToLocal(int64_t stamp) {
     return stamp == 0 ? 0 : stamp + LocalOffset();

@@ -120,7 +120,7 @@ private:
     /// rxSuffix_ again whenever those texts have changed (their versions).
     struct FramingBytes {
         std::string bytes;
-        uint64_t version = ~uint64_t{0};
+        uint32_t version = ~uint32_t{0};
     } rxPrefixBytes_, rxSuffixBytes_;
     std::string portName_;
     std::atomic<int32_t> baud_{0}, bits_{0}, stop_{0}, parity_{0}, mode_{0};

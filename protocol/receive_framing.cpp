@@ -32,7 +32,7 @@ bool endsWith(const char* frame, std::size_t length, const std::string& tail) {
 // every pass, without the work.
 template <class Cache>
 inline const std::string& framingBytes(const SharedText& text, Cache& cache) {
-    const uint64_t version = text.version();
+    const uint32_t version = text.version();
     if (version != cache.version) {
         cache.bytes = hexTextToBytes(text.get());
         cache.version = version;

@@ -51,12 +51,12 @@ public:
     /// text reads this before get(), and derives again when it differs from
     /// the version it derived from: a set between the two only costs one
     /// more derivation.
-    uint64_t version() const { return version_.load(std::memory_order_acquire); }
+    uint32_t version() const { return version_.load(std::memory_order_acquire); }
 
 private:
     mutable SpinLock lock_;
     std::string text_;
-    std::atomic<uint64_t> version_{0};
+    std::atomic<uint32_t> version_{0};
 };
 
 }  // namespace xtok

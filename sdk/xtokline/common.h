@@ -19,10 +19,29 @@
 //
 // Each slot is commented with its number. tests/contract checks those numbers
 // against the compiler's own table layout.
+//
+// Calling convention of a slot, per target (XTOK_SLOT_CALL below):
+//  - Windows 32-bit x86: the Microsoft member-function convention (thiscall):
+//    the object in ECX, the other arguments on the stack right to left, the
+//    callee pops them; results in EAX (EDX:EAX for 64 bits).
+//  - Windows x86-64: the Microsoft x64 convention, the object as the first
+//    argument in RCX.
+//  - Linux x86-64 and 32-bit ARM: the platform's C++ ABI (System V AMD64,
+//    AAPCS soft-float), the object as the first argument.
+// Every slot is declared with XTOK_SLOT_CALL so that the convention does not
+// depend on a compiler's default; the slot-number test checks each one.
 #pragma once
 
 #include <cstdint>
 #include <new>
+
+#if defined(_MSC_VER) && defined(_M_IX86)
+#define XTOK_SLOT_CALL __thiscall
+#elif defined(_WIN32) && defined(__i386__)
+#define XTOK_SLOT_CALL __attribute__((thiscall))
+#else
+#define XTOK_SLOT_CALL
+#endif
 
 namespace xtok {
 

@@ -17,6 +17,8 @@
 
 #include <cstdint>
 
+#include "xtokline/common.h"
+
 namespace xtok {
 
 /// A tag: one datum addressed by "node?memorytype?datatype". Created by the
@@ -25,36 +27,38 @@ namespace xtok {
 class ITag {
 public:
     /// slot 0
-    virtual void* Destroy(unsigned flags) = 0;
+    virtual void* XTOK_SLOT_CALL Destroy(unsigned flags) = 0;
     /// slot 1: an independent copy, owned by the caller.
-    virtual ITag* Clone() = 0;
+    virtual ITag* XTOK_SLOT_CALL Clone() = 0;
     /// slot 2: byte offset of the datum within its memory type.
-    virtual int32_t GetByteAddress() = 0;
+    virtual int32_t XTOK_SLOT_CALL GetByteAddress() = 0;
     /// slot 3: bit within the first byte for the bit types (0-7).
-    virtual int32_t GetBitOffset() = 0;
+    virtual int32_t XTOK_SLOT_CALL GetBitOffset() = 0;
     /// slot 4: the address text, unchanged.
-    virtual const char* GetUri() = 0;
+    virtual const char* XTOK_SLOT_CALL GetUri() = 0;
     /// slot 5: data type code (1 boolean ... 27 object).
-    virtual int32_t GetTypeCode() = 0;
+    virtual int32_t XTOK_SLOT_CALL GetTypeCode() = 0;
     /// slot 6: size in bytes; in bits for codes 1 and 13.
-    virtual int32_t GetSize() = 0;
+    virtual int32_t XTOK_SLOT_CALL GetSize() = 0;
     /// slot 7: element code; non-zero exactly for arrays and strings.
-    virtual int32_t GetElementCode() = 0;
+    virtual int32_t XTOK_SLOT_CALL GetElementCode() = 0;
     /// slot 8: bytes the datum occupies on the device.
-    virtual int32_t GetRawSize() = 0;
+    virtual int32_t XTOK_SLOT_CALL GetRawSize() = 0;
     /// slot 9: same as slot 12.
-    virtual bool ConvertData(const void* source, void* target, int32_t direction) = 0;
+    virtual bool XTOK_SLOT_CALL ConvertData(const void* source, void* target,
+                                            int32_t direction) = 0;
     /// slot 10
-    virtual bool IsReadOnly() = 0;
+    virtual bool XTOK_SLOT_CALL IsReadOnly() = 0;
     /// slot 11
-    virtual bool IsWriteOnly() = 0;
+    virtual bool XTOK_SLOT_CALL IsWriteOnly() = 0;
     /// slot 12: raw bytes <-> value with the tag's conversions; direction 0
     /// reads (device to runtime), non-zero writes.
-    virtual bool Convert(const void* source, void* target, int32_t direction) = 0;
+    virtual bool XTOK_SLOT_CALL Convert(const void* source, void* target, int32_t direction) = 0;
     /// slot 13: one named conversion on GetSize() bytes in place.
-    virtual bool ApplyConversion(uint8_t* bytes, const char* name, int32_t direction) = 0;
+    virtual bool XTOK_SLOT_CALL ApplyConversion(uint8_t* bytes, const char* name,
+                                                int32_t direction) = 0;
     /// slot 14: same as slot 0.
-    virtual void* DeleteSelf(unsigned flags) = 0;
+    virtual void* XTOK_SLOT_CALL DeleteSelf(unsigned flags) = 0;
 };
 
 /// The protocol: IProtocol to IProtocol7 are prefixes of this one table of
@@ -64,94 +68,98 @@ public:
 /// unused here.
 class IProtocol7 {
 public:
-    virtual void* Destroy(unsigned flags) = 0;                                   // 0
-    virtual void* GetInterface(const char* name) = 0;                            // 1
-    virtual const char* GetClassName() = 0;                                      // 2
-    virtual int32_t GetImplementationVersion() = 0;                              // 3
-    virtual bool Configure(const char* text) = 0;                                // 4
-    virtual ITag* CreateTag(const char* uri) = 0;                                // 5
-    virtual void DeleteTag(ITag* tag) = 0;                                       // 6
-    virtual bool CanJoinTags(ITag* first, ITag* second, int32_t flag) = 0;       // 7
-    virtual bool Start() = 0;                                                    // 8
-    virtual bool Stop() = 0;                                                     // 9
-    virtual bool ReadTag(ITag* tag, void* value) = 0;                            // 10
-    virtual bool WriteTag(ITag* tag, const void* value) = 0;                     // 11
-    virtual bool ReadTagRaw(ITag* tag, void* buffer, int32_t size) = 0;          // 12
-    virtual bool WriteTagOptimized(ITag* tag, const void* value) = 0;            // 13
-    virtual int32_t GetMaxTagsPerBlock(ITag* tag) = 0;                           // 14
-    virtual int32_t GetMaxBytesPerBlock(ITag* tag) = 0;                          // 15
-    virtual bool CanJoinBlock(ITag* first, ITag* tag) = 0;                       // 16
-    virtual bool ReadBlockRaw(ITag* first, int32_t count, void* buffer) = 0;     // 17
-    virtual const char* GetName() = 0;                                           // 18
-    virtual const char* GetNameFor(int32_t a, int32_t b) = 0;                    // 19
-    virtual int32_t GetLastErrorCode() = 0;                                      // 20
-    virtual const char* GetLastErrorText() = 0;                                  // 21
-    virtual int32_t GetVersion() = 0;                                            // 22
-    virtual int32_t GetCode() = 0;                                               // 23
-    virtual const char* GetDisplayName() = 0;                                    // 24
-    virtual int32_t GetInfo(char* buffer, int32_t size) = 0;                     // 25
-    virtual const char* GetXmlDescription() = 0;                                 // 26
-    virtual bool OmitsServiceInfo() = 0;                                         // 27
-    virtual const char* GetInstanceName() = 0;                                   // 28
-    virtual void SetInstanceName(const char* name) = 0;                          // 29
-    virtual bool DoCommand(const char* command, char* reply, int32_t size) = 0;  // 30
-    virtual int32_t QueryRecord(int32_t query, void* record) = 0;                // 31
-    virtual bool CanReadMultiple(ITag** tags, int32_t count, ITag* first) = 0;   // 32
-    virtual bool ReadMultiple(ITag* first, int32_t count, void* buffer,
-                              int32_t* status) = 0;                           // 33
-    virtual int32_t Reserved34() = 0;                                         // 34
-    virtual int32_t Reserved35() = 0;                                         // 35
-    virtual int32_t Reserved36() = 0;                                         // 36
-    virtual int32_t Reserved37() = 0;                                         // 37
-    virtual int32_t GetTagProperty(ITag* tag) = 0;                            // 38
-    virtual bool HasOptimizedRead(ITag* tag) = 0;                             // 39
-    virtual bool ReadOptimized(ITag* tag, void* buffer, int32_t bits) = 0;    // 40
-    virtual int32_t Reserved41() = 0;                                         // 41
-    virtual int32_t GetMaxTagCount() = 0;                                     // 42
-    virtual bool TagLess(ITag* a, ITag* b) = 0;                               // 43
-    virtual bool TagFollows(ITag* a, ITag* b) = 0;                            // 44
-    virtual int32_t Reserved45() = 0;                                         // 45
-    virtual int32_t Reserved46() = 0;                                         // 46
-    virtual int32_t Reserved47() = 0;                                         // 47
-    virtual int32_t Reserved48() = 0;                                         // 48
-    virtual int32_t Reserved49() = 0;                                         // 49
-    virtual int32_t Reserved50() = 0;                                         // 50
-    virtual bool ReadObject(ITag* tag, void* value) = 0;                      // 51
-    virtual bool WriteObject(ITag* tag, const void* value) = 0;               // 52
-    virtual int32_t GetConnectionKind() = 0;                                  // 53
-    virtual bool GetSerialSettings(char* buffer, int32_t length) = 0;         // 54
-    virtual int32_t GetLineOption() = 0;                                      // 55
-    virtual bool OpenEventChannel(void* a, void* b) = 0;                      // 56
-    virtual bool CloseEventChannel(void* a, void* b) = 0;                     // 57
-    virtual void NotifyEventChannel(void* a, void* b) = 0;                    // 58
-    virtual bool ReadEventChannel(void* a, void* b) = 0;                      // 59
-    virtual bool WriteEventChannel(void* a, void* b) = 0;                     // 60
-    virtual int32_t Reserved61() = 0;                                         // 61
-    virtual void NotifyAlarms(void* a, void* b) = 0;                          // 62
-    virtual bool ReadAlarms(void* a, void* b) = 0;                            // 63
-    virtual void AcknowledgeAlarms(void* a, void* b) = 0;                     // 64
-    virtual int32_t Reserved65() = 0;                                         // 65
-    virtual int32_t Reserved66() = 0;                                         // 66
-    virtual bool ReadTrends(void* a, void* b) = 0;                            // 67
-    virtual void NotifyTrends(void* a, void* b) = 0;                          // 68
-    virtual int32_t Reserved69() = 0;                                         // 69
-    virtual int32_t Reserved70() = 0;                                         // 70
-    virtual bool ReadTagStamped(ITag* tag, void* value, int64_t* stamp) = 0;  // 71
-    virtual bool ReadTagRawStamped(ITag* tag, void* buffer, int32_t size,
-                                   int64_t* stamp) = 0;  // 72
-    virtual bool ReadMultipleStamped(ITag* first, int32_t count, void* buffer, int32_t* status,
-                                     int64_t* stamps) = 0;                           // 73
-    virtual int32_t GetUriFieldCount() = 0;                                          // 74
-    virtual const char* GetUriFieldName(int32_t index) = 0;                          // 75
-    virtual int32_t GetUriFieldIndex(const char* name) = 0;                          // 76
-    virtual const char* GetUriField(ITag* tag, int32_t index, int32_t* length) = 0;  // 77
-    virtual bool ReadArrayItem(ITag* tag, int32_t index, void* value) = 0;           // 78
-    virtual bool WriteArrayItem(ITag* tag, int32_t index, const void* value) = 0;    // 79
-    virtual bool ReadOptimizedStamped(ITag* tag, void* buffer, int32_t bits,
-                                      int64_t* stamp) = 0;  // 80
-    virtual ITag* NewTag(const char* uri) = 0;              // 81
-    virtual int32_t GetMaxAccessTime(int32_t reset) = 0;    // 82
-    virtual const char* const* GetUriFieldNames() = 0;      // 83
+    virtual void* XTOK_SLOT_CALL Destroy(unsigned flags) = 0;                                // 0
+    virtual void* XTOK_SLOT_CALL GetInterface(const char* name) = 0;                         // 1
+    virtual const char* XTOK_SLOT_CALL GetClassName() = 0;                                   // 2
+    virtual int32_t XTOK_SLOT_CALL GetImplementationVersion() = 0;                           // 3
+    virtual bool XTOK_SLOT_CALL Configure(const char* text) = 0;                             // 4
+    virtual ITag* XTOK_SLOT_CALL CreateTag(const char* uri) = 0;                             // 5
+    virtual void XTOK_SLOT_CALL DeleteTag(ITag* tag) = 0;                                    // 6
+    virtual bool XTOK_SLOT_CALL CanJoinTags(ITag* first, ITag* second, int32_t flag) = 0;    // 7
+    virtual bool XTOK_SLOT_CALL Start() = 0;                                                 // 8
+    virtual bool XTOK_SLOT_CALL Stop() = 0;                                                  // 9
+    virtual bool XTOK_SLOT_CALL ReadTag(ITag* tag, void* value) = 0;                         // 10
+    virtual bool XTOK_SLOT_CALL WriteTag(ITag* tag, const void* value) = 0;                  // 11
+    virtual bool XTOK_SLOT_CALL ReadTagRaw(ITag* tag, void* buffer, int32_t size) = 0;       // 12
+    virtual bool XTOK_SLOT_CALL WriteTagOptimized(ITag* tag, const void* value) = 0;         // 13
+    virtual int32_t XTOK_SLOT_CALL GetMaxTagsPerBlock(ITag* tag) = 0;                        // 14
+    virtual int32_t XTOK_SLOT_CALL GetMaxBytesPerBlock(ITag* tag) = 0;                       // 15
+    virtual bool XTOK_SLOT_CALL CanJoinBlock(ITag* first, ITag* tag) = 0;                    // 16
+    virtual bool XTOK_SLOT_CALL ReadBlockRaw(ITag* first, int32_t count, void* buffer) = 0;  // 17
+    virtual const char* XTOK_SLOT_CALL GetName() = 0;                                        // 18
+    virtual const char* XTOK_SLOT_CALL GetNameFor(int32_t a, int32_t b) = 0;                 // 19
+    virtual int32_t XTOK_SLOT_CALL GetLastErrorCode() = 0;                                   // 20
+    virtual const char* XTOK_SLOT_CALL GetLastErrorText() = 0;                               // 21
+    virtual int32_t XTOK_SLOT_CALL GetVersion() = 0;                                         // 22
+    virtual int32_t XTOK_SLOT_CALL GetCode() = 0;                                            // 23
+    virtual const char* XTOK_SLOT_CALL GetDisplayName() = 0;                                 // 24
+    virtual int32_t XTOK_SLOT_CALL GetInfo(char* buffer, int32_t size) = 0;                  // 25
+    virtual const char* XTOK_SLOT_CALL GetXmlDescription() = 0;                              // 26
+    virtual bool XTOK_SLOT_CALL OmitsServiceInfo() = 0;                                      // 27
+    virtual const char* XTOK_SLOT_CALL GetInstanceName() = 0;                                // 28
+    virtual void XTOK_SLOT_CALL SetInstanceName(const char* name) = 0;                       // 29
+    virtual bool XTOK_SLOT_CALL DoCommand(const char* command, char* reply,
+                                          int32_t size) = 0;                                   // 30
+    virtual int32_t XTOK_SLOT_CALL QueryRecord(int32_t query, void* record) = 0;               // 31
+    virtual bool XTOK_SLOT_CALL CanReadMultiple(ITag** tags, int32_t count, ITag* first) = 0;  // 32
+    virtual bool XTOK_SLOT_CALL ReadMultiple(ITag* first, int32_t count, void* buffer,
+                                             int32_t* status) = 0;                           // 33
+    virtual int32_t XTOK_SLOT_CALL Reserved34() = 0;                                         // 34
+    virtual int32_t XTOK_SLOT_CALL Reserved35() = 0;                                         // 35
+    virtual int32_t XTOK_SLOT_CALL Reserved36() = 0;                                         // 36
+    virtual int32_t XTOK_SLOT_CALL Reserved37() = 0;                                         // 37
+    virtual int32_t XTOK_SLOT_CALL GetTagProperty(ITag* tag) = 0;                            // 38
+    virtual bool XTOK_SLOT_CALL HasOptimizedRead(ITag* tag) = 0;                             // 39
+    virtual bool XTOK_SLOT_CALL ReadOptimized(ITag* tag, void* buffer, int32_t bits) = 0;    // 40
+    virtual int32_t XTOK_SLOT_CALL Reserved41() = 0;                                         // 41
+    virtual int32_t XTOK_SLOT_CALL GetMaxTagCount() = 0;                                     // 42
+    virtual bool XTOK_SLOT_CALL TagLess(ITag* a, ITag* b) = 0;                               // 43
+    virtual bool XTOK_SLOT_CALL TagFollows(ITag* a, ITag* b) = 0;                            // 44
+    virtual int32_t XTOK_SLOT_CALL Reserved45() = 0;                                         // 45
+    virtual int32_t XTOK_SLOT_CALL Reserved46() = 0;                                         // 46
+    virtual int32_t XTOK_SLOT_CALL Reserved47() = 0;                                         // 47
+    virtual int32_t XTOK_SLOT_CALL Reserved48() = 0;                                         // 48
+    virtual int32_t XTOK_SLOT_CALL Reserved49() = 0;                                         // 49
+    virtual int32_t XTOK_SLOT_CALL Reserved50() = 0;                                         // 50
+    virtual bool XTOK_SLOT_CALL ReadObject(ITag* tag, void* value) = 0;                      // 51
+    virtual bool XTOK_SLOT_CALL WriteObject(ITag* tag, const void* value) = 0;               // 52
+    virtual int32_t XTOK_SLOT_CALL GetConnectionKind() = 0;                                  // 53
+    virtual bool XTOK_SLOT_CALL GetSerialSettings(char* buffer, int32_t length) = 0;         // 54
+    virtual int32_t XTOK_SLOT_CALL GetLineOption() = 0;                                      // 55
+    virtual bool XTOK_SLOT_CALL OpenEventChannel(void* a, void* b) = 0;                      // 56
+    virtual bool XTOK_SLOT_CALL CloseEventChannel(void* a, void* b) = 0;                     // 57
+    virtual void XTOK_SLOT_CALL NotifyEventChannel(void* a, void* b) = 0;                    // 58
+    virtual bool XTOK_SLOT_CALL ReadEventChannel(void* a, void* b) = 0;                      // 59
+    virtual bool XTOK_SLOT_CALL WriteEventChannel(void* a, void* b) = 0;                     // 60
+    virtual int32_t XTOK_SLOT_CALL Reserved61() = 0;                                         // 61
+    virtual void XTOK_SLOT_CALL NotifyAlarms(void* a, void* b) = 0;                          // 62
+    virtual bool XTOK_SLOT_CALL ReadAlarms(void* a, void* b) = 0;                            // 63
+    virtual void XTOK_SLOT_CALL AcknowledgeAlarms(void* a, void* b) = 0;                     // 64
+    virtual int32_t XTOK_SLOT_CALL Reserved65() = 0;                                         // 65
+    virtual int32_t XTOK_SLOT_CALL Reserved66() = 0;                                         // 66
+    virtual bool XTOK_SLOT_CALL ReadTrends(void* a, void* b) = 0;                            // 67
+    virtual void XTOK_SLOT_CALL NotifyTrends(void* a, void* b) = 0;                          // 68
+    virtual int32_t XTOK_SLOT_CALL Reserved69() = 0;                                         // 69
+    virtual int32_t XTOK_SLOT_CALL Reserved70() = 0;                                         // 70
+    virtual bool XTOK_SLOT_CALL ReadTagStamped(ITag* tag, void* value, int64_t* stamp) = 0;  // 71
+    virtual bool XTOK_SLOT_CALL ReadTagRawStamped(ITag* tag, void* buffer, int32_t size,
+                                                  int64_t* stamp) = 0;  // 72
+    virtual bool XTOK_SLOT_CALL ReadMultipleStamped(ITag* first, int32_t count, void* buffer,
+                                                    int32_t* status,
+                                                    int64_t* stamps) = 0;   // 73
+    virtual int32_t XTOK_SLOT_CALL GetUriFieldCount() = 0;                  // 74
+    virtual const char* XTOK_SLOT_CALL GetUriFieldName(int32_t index) = 0;  // 75
+    virtual int32_t XTOK_SLOT_CALL GetUriFieldIndex(const char* name) = 0;  // 76
+    virtual const char* XTOK_SLOT_CALL GetUriField(ITag* tag, int32_t index,
+                                                   int32_t* length) = 0;                   // 77
+    virtual bool XTOK_SLOT_CALL ReadArrayItem(ITag* tag, int32_t index, void* value) = 0;  // 78
+    virtual bool XTOK_SLOT_CALL WriteArrayItem(ITag* tag, int32_t index,
+                                               const void* value) = 0;  // 79
+    virtual bool XTOK_SLOT_CALL ReadOptimizedStamped(ITag* tag, void* buffer, int32_t bits,
+                                                     int64_t* stamp) = 0;  // 80
+    virtual ITag* XTOK_SLOT_CALL NewTag(const char* uri) = 0;              // 81
+    virtual int32_t XTOK_SLOT_CALL GetMaxAccessTime(int32_t reset) = 0;    // 82
+    virtual const char* const* XTOK_SLOT_CALL GetUriFieldNames() = 0;      // 83
 };
 
 /// Number of slots in the protocol table.

@@ -2,7 +2,9 @@
 // one export, a static root whose module fills the library's own service
 // table, and the description block found in the file by its marker.
 #include <gtest/gtest.h>
+#if XTOK_TEST_ZLIB
 #include <zlib.h>
+#endif
 
 #include <regex>
 
@@ -16,8 +18,7 @@ namespace {
 // dlclose runs the library's static destructors (nothing else holds it): the
 // root's module gives back what one open Init took.
 TEST(Library, OneExportAStaticRootAndUnloadReleasesAnOpenInit) {
-    EXPECT_EQ(definedDynamicSymbols(XTOK_PLUGIN_PATH),
-              std::vector<std::string>{"GetInterfaceFactory"});
+    EXPECT_EQ(exportedSymbols(XTOK_PLUGIN_PATH), std::vector<std::string>{"GetInterfaceFactory"});
     FakeHost host;
     {
         PluginLibrary lib;
@@ -33,7 +34,7 @@ TEST(Library, OneExportAStaticRootAndUnloadReleasesAnOpenInit) {
 
 // Every match of `pattern`, its groups from the last to the first joined by
 // '=', the matches separated by spaces.
-std::string matches(const std::string& text, const char* pattern) {
+[[maybe_unused]] std::string matches(const std::string& text, const char* pattern) {
     std::string out;
     std::regex re(pattern);
     for (std::sregex_iterator it(text.begin(), text.end(), re), end; it != end; ++it) {
@@ -44,26 +45,36 @@ std::string matches(const std::string& text, const char* pattern) {
     return out;
 }
 
-// Header, size line, stream and end marker, each text ending in a zero byte.
-TEST(Library, DescriptionBlockInTheFile) {
-    const std::string file = readWholeFile(XTOK_PLUGIN_PATH);
+// The stream between the size line and the end marker of the one block in
+// the file, or "" when the block is malformed.
+std::string compressedDescription(const std::string& file) {
     const std::string header(
         "<<ICOM_XML_START>>Name=XTOK?FullName=Xtokline?Version=106?Platform=PX40_WCE6", 77);
     const std::size_t at = file.find(header);
-    ASSERT_NE(at, std::string::npos);
-    EXPECT_EQ(file.find("<<ICOM_XML_START>>", at + 1), std::string::npos);  // one copy only
+    if (at == std::string::npos || file.find("<<ICOM_XML_START>>", at + 1) != std::string::npos) {
+        return "";  // none, or more than one copy
+    }
     const std::string sizeLine = file.c_str() + at + header.size();
     const std::size_t streamAt = at + header.size() + sizeLine.size() + 1;
-    const uLong length = file.find("<<ICOM_XML_END>>", streamAt) - streamAt;
-    EXPECT_EQ(sizeLine, "compressedXML=" + std::to_string(length));
-    ASSERT_EQ(file.compare(streamAt + length, 17, std::string("<<ICOM_XML_END>>", 17)), 0);
+    const std::size_t length = file.find("<<ICOM_XML_END>>", streamAt) - streamAt;
+    const bool whole =
+        sizeLine == "compressedXML=" + std::to_string(length) &&
+        file.compare(streamAt + length, 17, std::string("<<ICOM_XML_END>>", 17)) == 0;
+    return whole ? file.substr(streamAt, length) : "";
+}
+
+// Header, size line, stream and end marker, each text ending in a zero byte.
+TEST(Library, DescriptionBlockInTheFile) {
+    const std::string stream = compressedDescription(readWholeFile(XTOK_PLUGIN_PATH));
+    ASSERT_FALSE(stream.empty());
+#if XTOK_TEST_ZLIB
     std::string xml(1 << 16, '\0');
     uLongf size = xml.size();
-    uLong used = length;
+    uLong used = stream.size();
     ASSERT_EQ(uncompress2(reinterpret_cast<Bytef*>(xml.data()), &size,
-                          reinterpret_cast<const Bytef*>(&file[streamAt]), &used),
+                          reinterpret_cast<const Bytef*>(stream.data()), &used),
               Z_OK);
-    xml.resize(used == length ? size : 0);  // the whole stream, nothing after it
+    xml.resize(used == stream.size() ? size : 0);  // the whole stream, nothing after it
     EXPECT_EQ(xml.rfind("<?xml version=", 0), 0u);
     EXPECT_EQ(xml.rfind("</protocol_cfg>\n"), xml.size() - 16);
     EXPECT_EQ(matches(xml, ">(\\w+)</(name|code)>"), "name=XTOK code=471 ");
@@ -75,6 +86,10 @@ TEST(Library, DescriptionBlockInTheFile) {
               "tx_token rx_token rx_token_len tokens_available token_ack connect SP_Baud SP_Bits "
               "SP_Stop SP_Par SP_Mode SP_RxPrefix SP_RxSuffix SP_Gap SP_TxPrefix SP_TxSuffix "
               "SP_HexTokens SP_TokenQueueSize SP_Done ");
+#else
+    GTEST_SKIP() << "block found; no zlib for this target, so its XML is inflated and checked "
+                    "by the Linux and Windows runs only";
+#endif
 }
 
 }  // namespace

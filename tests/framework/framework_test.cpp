@@ -160,10 +160,11 @@ TEST(Clock, StampsAndBrokenDownTimesBothWays) {
         SystemTimeToStamp({1600, 12, 0, 31}, stamp) || SystemTimeToStamp({30828, 1, 0, 1}, stamp) ||
         SystemTimeToStamp({2000, 1, 0, 1, 24}, stamp) ||
         SystemTimeToStamp({2000, 1, 0, 1, 0, 0, 0, 1000}, stamp));
-    std::time_t now = std::time(nullptr);
-    std::tm local{};
-    localtime_r(&now, &local);  // the zone's offset as the C library has it
-    EXPECT_EQ(LocalOffset(), local.tm_gmtoff * 1000);
+    // The zone's offset as the C library has it: now's UTC fields read as a local time.
+    const std::time_t now = std::time(nullptr);
+    std::tm utc = *std::gmtime(&now);
+    utc.tm_isdst = -1;
+    EXPECT_EQ(LocalOffset(), (now - std::mktime(&utc)) * 1000);
     EXPECT_EQ(ToUtc(ToLocal(1000)) * 10 + ToLocal(0) + ToUtc(0), 10000);  // no time stays none
 }
 

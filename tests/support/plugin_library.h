@@ -1,5 +1,6 @@
-// The built plug-in as a foreign runtime sees it: loaded with dlopen, reached
-// through GetInterfaceFactory and slot numbers only.
+// The built plug-in as a foreign runtime sees it: loaded by the system's
+// loader (dlopen, LoadLibrary), reached through GetInterfaceFactory and slot
+// numbers only. The loading half has one source per system.
 #pragma once
 
 #include <string>
@@ -7,7 +8,7 @@
 
 namespace xtok::test {
 
-/// dlopen of a plug-in file for the lifetime of the object.
+/// The plug-in file loaded for the lifetime of the object.
 class PluginLibrary {
 public:
     explicit PluginLibrary(const char* path = XTOK_PLUGIN_PATH);
@@ -27,9 +28,9 @@ private:
     std::string error_;
 };
 
-/// Names of the symbols an ELF shared object defines in its dynamic symbol
-/// table (what other objects can link against).
-std::vector<std::string> definedDynamicSymbols(const std::string& path);
+/// Names a library file exports to other programs: the defined symbols of an
+/// ELF dynamic symbol table, or a Windows DLL's export names.
+std::vector<std::string> exportedSymbols(const std::string& path);
 
 /// The whole file as bytes; empty when it cannot be read.
 std::string readWholeFile(const std::string& path);
