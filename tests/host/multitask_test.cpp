@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "host/multitask.h"
+#include "tests/host/notice_log.h"
 
 namespace xtok::host {
 namespace {
@@ -97,6 +98,45 @@ TEST(Locks, AreRecursiveAndExcludeOtherThreads) {
     EXPECT_FALSE(otherThreadGetsIt());
     mutex->Unlock();
     EXPECT_TRUE(otherThreadGetsIt());
+    tasks.DestroyMutex(mutex);
+}
+
+TEST(Tasks, ShutdownLeavesAStuckTaskRunningWithAValidHandle) {
+    test::NoticeLog notices;
+    Body body(false);
+    {
+        MultiTask tasks(notices.sink(), 10);
+        ASSERT_NE(startTask(tasks, body), nullptr);
+    }
+    EXPECT_EQ(notices.count("did not stop"), 1);
+    // The body outlives the service and can still ask its handle.
+    body.release();
+    body.waitFinished();
+}
+TEST(Locks, KeepCountsExactUnderContention) {
+    MultiTask tasks;
+    IMutex* mutex = tasks.CreateMutex(0);
+    constexpr int kThreads = 4;
+    constexpr int kRounds = 50000;
+    long counter = 0;  // deliberately not atomic: only the lock protects it
+    std::vector<std::thread> threads;
+    for (int t = 0; t < kThreads; ++t) {
+        threads.emplace_back([&] {
+            for (int i = 0; i < kRounds; ++i) {
+                mutex->Lock();
+                mutex->Lock();
+                ++counter;
+                mutex->Unlock();
+                mutex->Unlock();
+            }
+        });
+    }
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+    EXPECT_EQ(counter, long{kThreads} * kRounds);
+    EXPECT_TRUE(mutex->TryLock());
+    mutex->Unlock();
     tasks.DestroyMutex(mutex);
 }
 

@@ -56,6 +56,22 @@ protected:
     }
 };
 
+// A read or write of a token type holds the queue lock (made first) once,
+// for its whole duration, whatever the tag's size.
+TEST_F(Locks, ATokenTypeAccessTakesTheQueueLockOnce) {
+    ASSERT_TRUE(start("autoConnect=false"));
+    FakeMutex& queue = *host.tasks().mutex(0);
+    for (const char* uri :
+         {"0?tokens_available?unsignedInt", "0?rx_token_len?unsignedInt", "0?rx_token?string-64"}) {
+        const long before = queue.locks;
+        read(uri, 1);
+        EXPECT_EQ(queue.locks - before, 1) << uri;
+    }
+    const long before = queue.locks;
+    writeBool("token_ack", true);
+    EXPECT_EQ(queue.locks - before, 1);
+}
+
 TEST_F(Locks, WithRoomForAllEveryTokenArrivesOnceInOrder) {
     ASSERT_TRUE(start("rx_prefix=02 rx_suffix=03 token_queue_size=10000"));
     tag("0?rx_token?string-16"), tag("0?token_ack?boolean"), tag("0?tokens_available?unsignedInt");

@@ -24,36 +24,29 @@ protected:
 };
 
 TEST_F(MemoryTypes, EveryTypeReadsItsValue) {
-    ASSERT_TRUE(protocol->Configure((kBaseConfig.substr(0, kBaseConfig.find("parity")) +
-                                     "parity=odd bits=8 stopbits=1 mode=RS-232 rx_prefix=0D "
-                                     "rx_suffix=0A gap=25 tx_prefix=02 tx_suffix=03 "
-                                     "token_queue_size=7")
-                                        .c_str()));
+    ASSERT_TRUE(protocol->Configure(
+        "CfgVer=1 model=1 port=com1 baudrate=9600 parity=odd bits=7 stopbits=2 mode=RS-422 "
+        "rx_prefix=0D rx_suffix=0A gap=25 tx_prefix=02 tx_suffix=03 token_queue_size=7"));
     ASSERT_TRUE(protocol->Start());
-    EXPECT_EQ(readInt("SP_Baud"), 9600);
-    EXPECT_EQ((std::vector{readByte("SP_Par"), readByte("SP_Bits"), readByte("SP_Stop"),
-                           readByte("SP_Mode")}),
-              (std::vector<std::optional<int>>{2, 8, 1, 0}));
-    EXPECT_EQ((std::vector{readText("SP_RxPrefix"), readText("SP_RxSuffix"),
-                           readText("SP_TxPrefix"), readText("SP_TxSuffix"), readText("tx_token")}),
-              (std::vector<std::optional<std::string>>{"0D", "0A", "02", "03", ""}));
-    EXPECT_EQ(readInt("SP_Gap"), 25);
-    EXPECT_EQ(readInt("SP_TokenQueueSize"), 7);
-    EXPECT_EQ((std::vector{readBool("SP_HexTokens"), readBool("SP_Done"), readBool("connect"),
-                           readBool("token_ack")}),
-              (std::vector<std::optional<bool>>{false, false, true, false}));
-    // An empty queue; rx_token_len then writes its first byte only.
-    EXPECT_EQ(readInt("tokens_available"), 0);
-    EXPECT_EQ(readText("rx_token"), "");
-    EXPECT_EQ(read("0?rx_token_len?unsignedInt", 4), std::string("\0\0\0\0", 4));
+    const std::vector<std::pair<std::string, std::size_t>> tags = {
+        {"0?SP_Baud?unsignedInt", 4},  {"0?SP_Par?unsignedByte", 1},
+        {"0?SP_Bits?unsignedByte", 1}, {"0?SP_Stop?unsignedByte", 1},
+        {"0?SP_Mode?unsignedByte", 1}, {"0?SP_RxPrefix?string-3", 3},
+        {"0?SP_TxSuffix?string-3", 3}, {"0?SP_Gap?unsignedInt", 4},
+        {"0?SP_HexTokens?boolean", 1}, {"0?SP_TokenQueueSize?unsignedInt", 4},
+        {"0?SP_Done?boolean", 1},      {"0?connect?boolean", 1},
+        {"0?token_ack?boolean", 1},    {"0?tx_token?string-2", 2},
+        {"0?tokens_available?unsignedInt", 4}, {"0?rx_token?string-3", 3},
+        {"0?rx_token_len?unsignedInt", 4}};
+    // An empty queue; rx_token_len then writes only its first byte.
+    EXPECT_EQ(readHex(tags), "80250000 02 07 02 02 304400 303300 19000000 00 07000000 00 01 00 "
+                             "0000 00000000 000000 00000000");
     play("0D 41 42 0A 0D 43 0A");
-    EXPECT_EQ(readInt("tokens_available"), 2);
-    EXPECT_EQ(readText("rx_token"), "AB");  // reading does not consume
-    EXPECT_EQ(readText("rx_token"), "AB");
-    EXPECT_EQ(readInt("rx_token_len"), 2);
+    EXPECT_EQ(readHex({{"0?tokens_available?unsignedInt", 4}, {"0?rx_token?string-3", 3},
+                       {"0?rx_token?string-3", 3}, {"0?rx_token_len?unsignedInt", 4}}),
+              "02000000 414200 414200 02000000");  // reading does not consume
     EXPECT_TRUE(writeBool("token_ack", true));
     EXPECT_EQ(readText("rx_token"), "C");
-    EXPECT_EQ(readInt("tokens_available"), 1);
 }
 
 TEST_F(MemoryTypes, TextsMustFitTheTagWithTheirZero) {

@@ -92,11 +92,26 @@ public:
     }
     /// A tag's value read through ReadTag as `size` bytes; none when it fails.
     std::optional<std::string> read(const std::string& uri, std::size_t size) {
-        std::vector<char> buffer(size + 16, '\0');
         ITag* t = tag(uri);
+        // ReadTag writes the tag's whole value, whatever part the test looks at.
+        std::vector<char> buffer(std::max<std::size_t>(size, t ? t->GetSize() : 0) + 16, '\0');
         return t && protocol->ReadTag(t, buffer.data())
                    ? std::optional(std::string(buffer.data(), size))
                    : std::nullopt;
+    }
+    /// Each tag's value as hex text ("-" when the read fails), blank-separated.
+    std::string readHex(const std::vector<std::pair<std::string, std::size_t>>& tags) {
+        std::string out;
+        for (const auto& [uri, size] : tags) {
+            const auto bytes = read(uri, size);
+            out += out.empty() ? "" : " ";
+            for (std::size_t i = 0; bytes && i < size; ++i) {
+                out += "0123456789ABCDEF"[static_cast<uint8_t>((*bytes)[i]) >> 4];
+                out += "0123456789ABCDEF"[(*bytes)[i] & 15];
+            }
+            out += bytes ? "" : "-";
+        }
+        return out;
     }
     std::optional<int32_t> readInt(const std::string& type) {
         auto bytes = read("0?" + type + "?unsignedInt", 4);

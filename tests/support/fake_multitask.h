@@ -41,9 +41,14 @@ private:
 class FakeMutex final : public IMutex {
 public:
     void* Destroy(unsigned) override { return this; }
-    void Lock() override { mutex_.lock(); }
+    void Lock() override {
+        mutex_.lock();
+        ++locks;
+    }
     bool TryLock() override { return mutex_.try_lock(); }
     void Unlock() override { mutex_.unlock(); }
+
+    std::atomic<long> locks{0};  ///< Lock calls so far
 
 private:
     std::recursive_mutex mutex_;
@@ -69,6 +74,11 @@ public:
     /// "CreateTask 3 0", "StopTask 1000", "CreateMutex 0", "DestroyMutex", in order.
     std::vector<std::string> calls() const;
     int mutexesAlive() const;
+    /// The `index`th lock made (0 first), or null.
+    FakeMutex* mutex(std::size_t index) const {
+        std::lock_guard<std::mutex> lock(mutex_);
+        return index < mutexes_.size() ? mutexes_[index].get() : nullptr;
+    }
     /// The most recently made task, or null.
     FakeTask* lastTask() const;
     /// Sleeps of 10 ms or more: a receive task idling.

@@ -20,8 +20,8 @@ struct Finished {
 class Subprocess {
 public:
     /// Starts `arguments` (the program first) with `input` on its standard
-    /// input. With `asNobody`, a root test drops the child to user nobody, so
-    /// that file permissions apply to it.
+    /// input; its output goes to files, read as it grows. With `asNobody`, a
+    /// root test drops the child to user nobody, so that file permissions apply.
     explicit Subprocess(std::vector<std::string> arguments, std::string input = "",
                         bool asNobody = false);
     /// Kills the child if it still runs, and reaps it.
@@ -29,8 +29,7 @@ public:
     Subprocess(const Subprocess&) = delete;
     Subprocess& operator=(const Subprocess&) = delete;
 
-    /// Reads output until standard output holds `text`; false when the
-    /// deadline passed or the output ended first.
+    /// Waits until standard output holds `text`; false at the deadline.
     bool waitForOutput(const std::string& text, std::chrono::milliseconds patience);
     /// Ctrl-C, as a person at the terminal would press it.
     void interrupt();
@@ -38,17 +37,10 @@ public:
     Finished finish(std::chrono::milliseconds patience);
 
 private:
-    /// One round of reading and writing; false once nothing is left open.
-    bool pump(int timeoutMs);
-    void closeFd(int& fd);
+    std::string file(const char* name) const;
 
     pid_t pid_ = -1;
-    int in_ = -1;
-    int out_ = -1;
-    int err_ = -1;
-    std::string input_;
-    std::size_t written_ = 0;
-    Finished result_;
+    std::string dir_;
 };
 
 /// Runs to the end with a generous deadline.
