@@ -3,7 +3,7 @@
 // reported into a small buffer, the framing and queue size read back and a
 // token sent, so that a value that slipped through the checks shows.
 #include "fuzz/fuzz_session.h"
-#include "protocol/hex_text.h"
+#include "xtokline/text.h"
 
 using namespace xtok;
 using namespace xtok::fuzz;

@@ -10,7 +10,7 @@
 #include <string>
 
 #include "fuzz/fuzz_session.h"
-#include "params/text.h"
+#include "xtokline/text.h"
 
 using namespace xtok;
 using namespace xtok::fuzz;

@@ -14,7 +14,7 @@
 #include <vector>
 
 #include "fuzz/fuzz_session.h"
-#include "protocol/hex_text.h"
+#include "xtokline/text.h"
 
 using namespace xtok;
 using namespace xtok::fuzz;

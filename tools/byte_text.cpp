@@ -1,23 +1,11 @@
 #include "tools/byte_text.h"
 
 #include <cstdio>
+#include "xtokline/text.h"
 
 namespace xtok::tools {
 
 namespace {
-
-int hexDigit(char c) {
-    if (c >= '0' && c <= '9') {
-        return c - '0';
-    }
-    if (c >= 'a' && c <= 'f') {
-        return c - 'a' + 10;
-    }
-    if (c >= 'A' && c <= 'F') {
-        return c - 'A' + 10;
-    }
-    return -1;
-}
 
 char simpleEscape(char c) {
     switch (c) {
@@ -96,8 +84,8 @@ bool unescapeBytes(const std::string& text, std::string& bytes, std::string& err
             bytes += c;
             continue;
         }
-        int high = i + 1 < text.size() ? hexDigit(text[i + 1]) : -1;
-        int low = i + 2 < text.size() ? hexDigit(text[i + 2]) : -1;
+        int high = i + 1 < text.size() ? hexDigitValue(text[i + 1]) : -1;
+        int low = i + 2 < text.size() ? hexDigitValue(text[i + 2]) : -1;
         if (high < 0 || low < 0) {
             error = "\\x needs two hex digits";
             return false;
