@@ -124,6 +124,7 @@ bool Protocol_XTOK::consoleConnect(const std::vector<std::string>& words, char* 
         CopyReply("ERROR: wrong value", reply, size);
         return false;
     }
+    HostLock lock(queueLock_);
     const bool done = setConnected(words[1] == "ON");
     CopyReply(done ? "OK" : "Can't open serial port", reply, size);
     return true;
@@ -135,6 +136,7 @@ bool Protocol_XTOK::consolePut(const char* line, char* reply, int32_t size) {
     while (*text == ' ') {
         ++text;
     }
+    HostLock lock(queueLock_);
     switch (send(text)) {
         case Sent::NotHex:
             CopyReply("ERROR: token to send must be in hex format", reply, size);

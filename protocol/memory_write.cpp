@@ -162,7 +162,6 @@ bool Protocol_XTOK::transmit(const std::string& text) {
 }
 
 Protocol_XTOK::Sent Protocol_XTOK::send(const std::string& text) {
-    HostLock lock(queueLock_);
     const bool hex = active_[kHexTokens] != 0;
     if (hex && !isHexText(text)) {
         return Sent::NotHex;

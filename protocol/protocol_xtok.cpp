@@ -125,13 +125,13 @@ bool Protocol_XTOK::Stop() {
     }
     // Should the task not end in time, the close still waits for its read.
     task_.StopTask(1000);
+    HostLock lock(queueLock_);
     setConnected(false);
     started_ = false;
     return true;
 }
 
 bool Protocol_XTOK::setConnected(bool on) {
-    HostLock queue(queueLock_);
     if (!on) {
         // Cleared before waiting for portLock: the receive task ends its
         // pass at the next byte instead of reading on.

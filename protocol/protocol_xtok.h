@@ -72,7 +72,8 @@ private:
     void loadRetainedSettings();
     LineSettings lineSettings() const;
     bool openPort();
-    /// Opens or closes the port under both locks; false when an open failed.
+    /// Opens or closes the port, taking portLock; the caller holds
+    /// queueLock. False when an open failed.
     bool setConnected(bool on);
 
     // Receiving.
@@ -101,7 +102,7 @@ private:
     bool writeConnect(const uint8_t* value, int32_t available);
     enum class Sent { Ok, NotHex, NotConnected };
     /// Frames and writes a token (hex text in hex mode); a failed write is
-    /// not reported.
+    /// not reported. The caller holds queueLock.
     Sent send(const std::string& text);
     bool transmit(const std::string& text);
     bool partialRead(XtokTag& tag, int32_t index, int32_t count, int32_t offset, int32_t rawSize,

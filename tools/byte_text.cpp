@@ -28,7 +28,7 @@ char simpleEscape(char c) {
 
 }  // namespace
 
-std::string escapeBytes(const std::string& bytes) {
+std::string escapeBytes(const std::string& bytes, const char* otherEscape) {
     std::string text;
     for (char c : bytes) {
         unsigned char byte = static_cast<unsigned char>(c);
@@ -44,8 +44,8 @@ std::string escapeBytes(const std::string& bytes) {
         } else if (byte >= 0x20 && byte < 0x7F) {
             text += c;
         } else {
-            char escape[5];
-            std::snprintf(escape, sizeof escape, "\\x%02X", byte);
+            char escape[8];
+            std::snprintf(escape, sizeof escape, otherEscape, byte);
             text += escape;
         }
     }
