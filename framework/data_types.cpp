@@ -2,7 +2,7 @@
 
 #include <cstddef>
 
-#include "params/text.h"
+#include "xtokline/text.h"
 
 namespace xtok {
 namespace {

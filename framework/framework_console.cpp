@@ -9,7 +9,7 @@
 #include "framework/protocol_base.h"
 #include "framework/scratch_buffer.h"
 #include "module/service_table.h"
-#include "params/text.h"
+#include "xtokline/text.h"
 
 namespace xtok {
 namespace {
@@ -37,23 +37,10 @@ void appendService(std::string& text, IHostService* service) {
     }
 }
 
-int hexDigit(char c) {
-    if (c >= '0' && c <= '9') {
-        return c - '0';
-    }
-    if (c >= 'a' && c <= 'f') {
-        return c - 'a' + 10;
-    }
-    if (c >= 'A' && c <= 'F') {
-        return c - 'A' + 10;
-    }
-    return -1;
-}
-
 bool hexToBytes(const std::string& hex, std::vector<uint8_t>& bytes) {
     for (std::size_t i = 0; i + 1 < hex.size(); i += 2) {
-        int high = hexDigit(hex[i]);
-        int low = hexDigit(hex[i + 1]);
+        int high = hexDigitValue(hex[i]);
+        int low = hexDigitValue(hex[i + 1]);
         if (high < 0 || low < 0) {
             return false;
         }
@@ -182,10 +169,10 @@ int32_t ProtocolBase::GetInfo(char* buffer, int32_t size) {
             std::to_string(GetImplementationVersion()) + "\n";
     text += "ProtocolBase v." + std::to_string(kFrameworkVersion) + "\n";
     text += "ProtLib v." + std::to_string(kLibraryVersion) + "\n";
-    if (!OmitsServiceInfo()) {
-        appendService(text, services().multiTask);
-        appendService(text, services().serialFactory);
-        appendService(text, services().socketFactory);
+    if (!OmitsServiceInfo() && services_) {
+        appendService(text, services_->multiTask);
+        appendService(text, services_->serialFactory);
+        appendService(text, services_->socketFactory);
     }
     if (!buffer || size <= 0) {
         return 0;

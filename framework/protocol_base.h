@@ -13,6 +13,7 @@
 #include <string>
 
 #include "framework/scratch_buffer.h"
+#include "module/service_table.h"
 #include "xtokline/protocol.h"
 
 namespace xtok {
@@ -21,7 +22,9 @@ class TagBase;
 
 class ProtocolBase : public IProtocol7 {
 public:
-    ProtocolBase() = default;
+    /// `services`: the host services a protocol was made with, listed by
+    /// GetInfo; null for none.
+    explicit ProtocolBase(const ServiceTable* services = nullptr) : services_(services) {}
     ProtocolBase(const ProtocolBase&) = delete;
     ProtocolBase& operator=(const ProtocolBase&) = delete;
 
@@ -140,6 +143,7 @@ private:
     void ConsoleRead(const std::string& uri, char* reply, int32_t size);
     void ConsoleWrite(const std::string& uri, const std::string& hex, char* reply, int32_t size);
 
+    const ServiceTable* services_;
     std::list<ITag*> tags_;
     int32_t lastErrorCode_ = 1;
     std::string lastErrorText_;

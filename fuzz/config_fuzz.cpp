@@ -1,7 +1,7 @@
 // Configuration texts: Configure refuses with a message or accepts, and what
 // it accepted starts a protocol whose framing and queue size are sane.
 #include "fuzz/fuzz_session.h"
-#include "protocol/hex_text.h"
+#include "xtokline/text.h"
 
 using namespace xtok::fuzz;
 

@@ -5,7 +5,7 @@
 #include <set>
 
 #include "fuzz/fuzz_session.h"
-#include "params/text.h"
+#include "xtokline/text.h"
 
 using namespace xtok;
 using namespace xtok::fuzz;

@@ -4,7 +4,7 @@
 // ("hex|hex", '|' a silence; "run HH N" N bytes HH), "read N", "ack" or
 // "console ...": the queue stays within its limit and tokens within 1000 bytes.
 #include "fuzz/fuzz_session.h"
-#include "protocol/hex_text.h"
+#include "xtokline/text.h"
 
 using namespace xtok;
 using namespace xtok::fuzz;

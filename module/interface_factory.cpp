@@ -4,18 +4,6 @@
 
 namespace xtok {
 
-namespace {
-
-// Built by the library's static initialisers, destroyed at unload; its
-// module's destructor then releases the services still held.
-InterfaceFactory root;
-
-}  // namespace
-
-InterfaceFactory& rootObject() {
-    return root;
-}
-
 void* InterfaceFactory::GetInterface(const char* name) {
     if (!name) {
         return nullptr;

@@ -9,6 +9,7 @@ namespace xtok {
 
 class InterfaceFactory final : public IInterfaceFactory {
 public:
+    explicit InterfaceFactory(ProtocolMaker make) : factory_(make, services()) {}
     void* GetInterface(const char* name) override;
     void Release() override {}
 
@@ -20,7 +21,8 @@ private:
     ProtModule module_;
 };
 
-/// The one root object of the loaded library, built at load time.
+/// The one root object of the loaded library, built at load time by the
+/// layer that knows the library's protocol.
 InterfaceFactory& rootObject();
 
 }  // namespace xtok

@@ -1,10 +1,6 @@
 #include "module/protocol_factory.h"
 
 #include <cstring>
-#include <new>
-
-#include "module/service_table.h"
-#include "protocol/protocol_xtok.h"
 
 namespace xtok {
 
@@ -22,19 +18,9 @@ void* ProtocolFactory::GetInterface(const char* name) {
 }
 
 IProtocol7* ProtocolFactory::CreateProtocol(const char* name) {
-    if (!name || std::strcmp(name, "XTOK") != 0) {
-        return nullptr;
-    }
     // A protocol takes its locks and port from the services Init acquired;
     // without them it could not run, so none is made.
-    if (!services().held) {
-        return nullptr;
-    }
-    try {
-        return new Protocol_XTOK();
-    } catch (const std::bad_alloc&) {
-        return nullptr;
-    }
+    return services_.held && name ? make_(name, services_) : nullptr;
 }
 
 void ProtocolFactory::DestroyProtocol(IProtocol7* protocol) {

@@ -8,10 +8,9 @@
 #include <string>
 #include <vector>
 
-#include "params/text.h"
-#include "protocol/hex_text.h"
 #include "protocol/host_lock.h"
 #include "protocol/protocol_xtok.h"
+#include "xtokline/text.h"
 
 namespace xtok {
 
@@ -31,22 +30,6 @@ const char kDriverHelp[] =
     "set_rxSuffix string - set the rx suffix\n"
     "set_txPrefix string - set the tx prefix\n"
     "set_txSuffix string - set the tx suffix\n";
-
-// Base-10 number at the start of `word`; false when no character was used.
-bool parseDecimal(const std::string& word, int32_t& out) {
-    const char* begin = word.c_str();
-    char* end = nullptr;
-    int saved = errno;
-    long long value = std::strtoll(begin, &end, 10);
-    errno = saved;
-    if (end == begin) {
-        return false;
-    }
-    out = static_cast<int32_t>(value > INT32_MAX   ? INT32_MAX
-                               : value < INT32_MIN ? INT32_MIN
-                                                   : value);
-    return true;
-}
 
 }  // namespace
 
@@ -88,72 +71,47 @@ bool Protocol_XTOK::driverCommand(const std::vector<std::string>& words, const c
         }
         return consolePut(line, reply, size);
     }
-    // The queue commands take no queueLock: a console for commissioning,
-    // where the runtime is not reading tokens at the same time. The receive
-    // task may push meanwhile; the queue guards itself against that.
+    if (queueCommand(words, reply, size, handled)) {
+        return true;
+    }
+    handled = true;
+    for (const Setting& setting : kSettings) {
+        if (setting.consoleSetter && cmd == setting.consoleSetter) {
+            if (missing) {
+                CopyReply("ERROR: new value is missing", reply, size);
+                return false;
+            }
+            return consoleSet(setting, words[1], reply, size);
+        }
+    }
+    handled = false;
+    return false;
+}
+
+// The queue's commands; `handled` false for any other.
+bool Protocol_XTOK::queueCommand(const std::vector<std::string>& words, char* reply, int32_t size,
+                                 bool& handled) {
+    const std::string& cmd = words[0];
+    HostLock lock(queueLock_);
+    const std::string* head = tokens_.head();
+    handled = true;
     if (cmd == "get") {
-        tokens_.withHead(
-            [&](const std::string* head) { CopyReply(head ? head->c_str() : "", reply, size); });
-        return true;
-    }
-    if (cmd == "tokens_available") {
+        CopyReply(head ? head->c_str() : "", reply, size);
+    } else if (cmd == "tokens_available") {
         CopyReply(std::to_string(tokens_.count()).c_str(), reply, size);
-        return true;
-    }
-    if (cmd == "get_token_length") {
-        const std::size_t length =
-            tokens_.withHead([](const std::string* head) { return head ? head->size() : 0; });
-        CopyReply(std::to_string(length).c_str(), reply, size);
-        return true;
-    }
-    if (cmd == "token_ack") {
+    } else if (cmd == "get_token_length") {
+        CopyReply(std::to_string(head ? head->size() : 0).c_str(), reply, size);
+    } else if (cmd == "token_ack") {
         if (words.size() == 2 && words[1] == "all") {
             tokens_.clear();
         } else {
             tokens_.removeHead();
         }
         CopyReply("OK", reply, size);
-        return true;
-    }
-    if (cmd == "set_hexToken" || cmd == "set_rxGap" || cmd == "set_rxPrefix" ||
-        cmd == "set_rxSuffix" || cmd == "set_txPrefix" || cmd == "set_txSuffix") {
-        if (missing) {
-            CopyReply("ERROR: new value is missing", reply, size);
-            return false;
-        }
-        return consoleSet(cmd, words[1], reply, size);
-    }
-    handled = false;
-    return false;
-}
-
-bool Protocol_XTOK::consoleSet(const std::string& cmd, const std::string& value, char* reply,
-                               int32_t size) {
-    const char* answer = "OK";
-    if (cmd == "set_hexToken") {
-        if (value == "ON" || value == "OFF") {
-            hexTokens_ = value == "ON";
-        } else {
-            answer = "ERROR: wrong value";
-        }
-    } else if (cmd == "set_rxGap") {
-        int32_t gap = 0;
-        if (parseDecimal(value, gap)) {
-            gap_ = gap;
-        } else {
-            answer = "ERROR: wrong value";
-        }
     } else {
-        // Stored as typed: a text that is not hex converts leniently when used.
-        SharedText& text = cmd == "set_rxPrefix"   ? rxPrefix_
-                           : cmd == "set_rxSuffix" ? rxSuffix_
-                           : cmd == "set_txPrefix" ? txPrefix_
-                                                   : txSuffix_;
-        text.set(value);
+        handled = false;
     }
-    // "ERROR: wrong value" still answers true here, unlike "connect".
-    CopyReply(answer, reply, size);
-    return true;
+    return handled;
 }
 
 bool Protocol_XTOK::consoleConnect(const std::vector<std::string>& words, char* reply,
@@ -162,28 +120,13 @@ bool Protocol_XTOK::consoleConnect(const std::vector<std::string>& words, char* 
         CopyReply("ERROR: new connect state is missing", reply, size);
         return false;
     }
-    if (words[1] == "OFF") {
-        if (connected_) {
-            connected_ = false;
-            HostLock lock(portLock_);
-            port_.Close();
-        }
-        CopyReply("OK", reply, size);
-        return true;
-    }
-    if (words[1] != "ON") {
+    if (words[1] != "ON" && words[1] != "OFF") {
         CopyReply("ERROR: wrong value", reply, size);
         return false;
     }
-    bool opened = true;
-    {
-        HostLock lock(portLock_);
-        if (!connected_) {
-            opened = openPort();
-            connected_ = opened;
-        }
-    }
-    CopyReply(opened ? "OK" : "Can't open serial port", reply, size);
+    HostLock lock(queueLock_);
+    const bool done = setConnected(words[1] == "ON");
+    CopyReply(done ? "OK" : "Can't open serial port", reply, size);
     return true;
 }
 
@@ -193,21 +136,18 @@ bool Protocol_XTOK::consolePut(const char* line, char* reply, int32_t size) {
     while (*text == ' ') {
         ++text;
     }
-    const bool hex = hexTokens_;
-    if (hex && !isHexText(text)) {
-        CopyReply("ERROR: token to send must be in hex format", reply, size);
-        return false;
+    HostLock lock(queueLock_);
+    switch (send(text)) {
+        case Sent::NotHex:
+            CopyReply("ERROR: token to send must be in hex format", reply, size);
+            return false;
+        case Sent::NotConnected:
+            CopyReply("ERROR: serial port is not active for sending", reply, size);
+            return false;
+        default:
+            CopyReply("OK", reply, size);
+            return true;
     }
-    if (!connected_) {
-        CopyReply("ERROR: serial port is not active for sending", reply, size);
-        return false;
-    }
-    std::string frame = hexTextToBytes(txPrefix_.get());
-    frame += hex ? hexTextToBytes(text) : std::string(text);
-    frame += hexTextToBytes(txSuffix_.get());
-    port_.Write(frame);
-    CopyReply("OK", reply, size);
-    return true;
 }
 
 }  // namespace xtok

@@ -5,10 +5,10 @@
 
 #include "framework/data_types.h"
 #include "framework/scratch_buffer.h"
-#include "protocol/hex_text.h"
 #include "protocol/host_lock.h"
 #include "protocol/protocol_xtok.h"
 #include "protocol/xtok_tag.h"
+#include "xtokline/text.h"
 
 namespace xtok {
 
@@ -18,27 +18,13 @@ namespace {
 // slack, and every number.
 constexpr std::size_t kScratchInline = 128;
 
-int32_t takeInt(const uint8_t* value) {
-    int32_t v = 0;
-    std::memcpy(&v, value, sizeof v);
-    return v;
-}
+}  // namespace
 
-// The text of a value: up to its first zero byte, and never past the
-// bytes the tag holds, which need not contain a zero.
 std::string takeText(const uint8_t* value, int32_t available) {
     const char* text = reinterpret_cast<const char*>(value);
     const void* zero = std::memchr(text, 0, static_cast<std::size_t>(std::max(available, 0)));
     return zero ? std::string(text) : std::string(text, static_cast<std::size_t>(available));
 }
-
-bool isBaudRate(int32_t baud) {
-    static const int32_t rates[] = {150,  300,   600,   1200,  2400,  4800,
-                                    9600, 19200, 38400, 57600, 115200};
-    return std::find(std::begin(rates), std::end(rates), baud) != std::end(rates);
-}
-
-}  // namespace
 
 bool Protocol_XTOK::WriteTag(ITag* itag, const void* value) {
     if (!started_) {
@@ -125,11 +111,11 @@ bool Protocol_XTOK::partialRead(XtokTag& tag, int32_t index, int32_t count, int3
 
 bool Protocol_XTOK::writeMemoryType(XtokTag& tag, int32_t, const uint8_t* value,
                                     int32_t available) {
-    if (tag.isSettingsTag() && tag.memoryType->name != "SP_Done") {
-        return stageSetting(tag, value, available);
-    }
     HostLock lock(queueLock_);
     const std::string& name = tag.memoryType->name;
+    if (const Setting* setting = findSettingByMemoryType(name)) {
+        return stageSetting(*setting, value, available);
+    }
     if (name == "SP_Done") {
         applyStagedSettings();
         return true;
@@ -148,132 +134,51 @@ bool Protocol_XTOK::writeMemoryType(XtokTag& tag, int32_t, const uint8_t* value,
     return false;
 }
 
-bool Protocol_XTOK::stageSetting(XtokTag& tag, const uint8_t* value, int32_t available) {
-    const std::string& name = tag.memoryType->name;
-    struct ByteType {
-        const char *type, *key;
-        int32_t low, high;
-    };
-    static const ByteType bytes[] = {{"SP_Par", "parity", 0, 4},
-                                     {"SP_Bits", "bits", 7, 8},
-                                     {"SP_Stop", "stop", 1, 2},
-                                     {"SP_Mode", "mode", 0, 2}};
-    for (const ByteType& b : bytes) {
-        if (name == b.type) {
-            int32_t v = value[0];
-            if (v < b.low || v > b.high) {
-                return false;  // refused without a message
-            }
-            stagedSettings_.stageInt(b.key, -1, v);
-            return true;
-        }
-    }
-    struct TextType {
-        const char *type, *key, *message;
-    };
-    static const TextType texts[] = {
-        {"SP_RxPrefix", "rx_prefix", "Rx prefix value is not hex format"},
-        {"SP_RxSuffix", "rx_suffix", "Rx suffix value is not hex format"},
-        {"SP_TxPrefix", "tx_prefix", "Tx prefix value is not hex format"},
-        {"SP_TxSuffix", "tx_suffix", "Tx suffix value is not hex format"}};
-    for (const TextType& t : texts) {
-        if (name == t.type) {
-            std::string text = takeText(value, available);
-            if (!isHexText(text)) {
-                SetLastError(-1, t.message);
-                return false;
-            }
-            stagedSettings_.stageText(t.key, -1, text);
-            return true;
-        }
-    }
-    if (name == "SP_Baud") {
-        int32_t baud = takeInt(value);
-        if (!isBaudRate(baud)) {
-            SetLastError(-1, "illegal baudrate intValue");
-            return false;
-        }
-        stagedSettings_.stageInt("baud", -1, baud);
-    } else if (name == "SP_Gap") {
-        stagedSettings_.stageInt("gap", -1, takeInt(value));
-    } else if (name == "SP_TokenQueueSize") {
-        stagedSettings_.stageInt("token_queue_size", -1, takeInt(value));
-    } else if (name == "SP_HexTokens") {
-        stagedSettings_.stageBool("hex_tokens", -1, value[0] != 0);
-    }
-    return true;
-}
-
-void Protocol_XTOK::applyStagedSettings() {
-    stagedSettings_.commitTo(settings_, -1, true);
-    auto pick = [this](const char* key, int32_t active) { return settingInt(key, active); };
-    bool changed = false;
-    auto apply = [&changed](std::atomic<int32_t>& active, int32_t value) {
-        if (value != active) {
-            active = value;
-            changed = true;
-        }
-    };
-    apply(baud_, pick("baud", baud_));
-    apply(parity_, pick("parity", parity_));
-    // The bits fall back to the active stop bits, not the active data bits;
-    // kept as retained configurations expect it.
-    apply(bits_, pick("bits", stop_));
-    apply(stop_, pick("stop", stop_));
-    apply(mode_, pick("mode", mode_));
-    if (changed) {
-        port_.Reconfigure(lineSettings());
-    }
-    auto pickText = [this](const char* key, SharedText& active) {
-        active.set(settingText(key, active.get()));
-    };
-    pickText("rx_prefix", rxPrefix_);
-    pickText("rx_suffix", rxSuffix_);
-    pickText("tx_prefix", txPrefix_);
-    pickText("tx_suffix", txSuffix_);
-    gap_ = pick("gap", gap_);
-    hexTokens_ = settingBool("hex_tokens", hexTokens_);
-    tokenQueueSize_ = pick("token_queue_size", tokenQueueSize_);
-    tokens_.clear();
-}
-
 bool Protocol_XTOK::writeConnect(const uint8_t* value, int32_t available) {
     const bool on = value[0] != 0;
-    if (connected_ && !on) {
-        HostLock lock(portLock_);
-        port_.Close();
-        connected_ = false;
-        return true;
+    if (on == connected_) {
+        // Asking for the state that already holds sends the value as a
+        // token: 1 while connected goes out as the byte 01.
+        return transmit(takeText(value, available));
     }
-    if (!connected_ && on) {
-        HostLock lock(portLock_);
-        if (!openPort()) {
-            SetLastError(-1, "Can't open serial port");
-            return false;
-        }
-        connected_ = true;
-        return true;
+    if (!setConnected(on)) {
+        SetLastError(-1, "Can't open serial port");
+        return false;
     }
-    // Asking for the state that already holds sends the value as a token:
-    // 1 while connected goes out as the byte 01.
-    return transmit(takeText(value, available));
+    return true;
 }
 
 bool Protocol_XTOK::transmit(const std::string& text) {
-    const bool hex = hexTokens_;
+    switch (send(text)) {
+        case Sent::NotHex:
+            SetLastError(-1, "token to send must be in hex format");
+            return false;
+        case Sent::NotConnected:
+            SetLastError(-1, "Serial port not active for sending");
+            return false;
+        default:
+            return true;
+    }
+}
+
+Protocol_XTOK::Sent Protocol_XTOK::send(const std::string& text) {
+    const bool hex = active_[kHexTokens] != 0;
     if (hex && !isHexText(text)) {
-        SetLastError(-1, "token to send must be in hex format");
-        return false;
+        return Sent::NotHex;
     }
     if (!connected_) {
-        SetLastError(-1, "Serial port not active for sending");
-        return false;
+        return Sent::NotConnected;
     }
-    std::string frame = hexTextToBytes(txPrefix_.get());
-    frame += hex ? hexTextToBytes(text) : text;
-    frame += hexTextToBytes(txSuffix_.get());
-    port_.Write(frame);  // a failed write is not reported
-    return true;
+    std::string frame;
+    appendHexBytes(activeText_[kTxPrefix], frame);
+    if (hex) {
+        appendHexBytes(text, frame);
+    } else {
+        frame += text;
+    }
+    appendHexBytes(activeText_[kTxSuffix], frame);
+    port_.Write(frame);
+    return Sent::Ok;
 }
 
 }  // namespace xtok

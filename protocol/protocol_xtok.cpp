@@ -5,18 +5,20 @@
 #include <new>
 
 #include "module/description_block.h"
-#include "module/service_table.h"
 #include "protocol/host_lock.h"
 #include "protocol/token_model.h"
 #include "protocol/xtok_tag.h"
 
 namespace xtok {
 
-Protocol_XTOK::Protocol_XTOK()
-    : task_(services().multiTask, *this), port_(services().serialFactory) {
+Protocol_XTOK::Protocol_XTOK(const ServiceTable& services)
+    : ProtocolBase(&services),
+      services_(services),
+      task_(services.multiTask, *this),
+      port_(services.serialFactory) {
     models_.push_back(buildTokenModel());
     frame_.reserve(1024);
-    if (IMultiTask2* tasks = services().multiTask) {
+    if (IMultiTask2* tasks = services_.multiTask) {
         queueLock_ = tasks->CreateMutex(0);
         portLock_ = tasks->CreateMutex(0);
     }
@@ -30,10 +32,10 @@ Protocol_XTOK::~Protocol_XTOK() {
     if (task_.HasTask()) {
         task_.StopTask(1000);
     }
-    const int32_t gap = gap_.load();
+    const int32_t gap = active_[kGap].load();
     const int32_t readTimeout = gap > 0 ? gap : 500;
     task_.Retire(readTimeout < INT32_MAX - 10000 ? readTimeout + 10000 : INT32_MAX);
-    if (IMultiTask2* tasks = services().multiTask) {
+    if (IMultiTask2* tasks = services_.multiTask) {
         tasks->DestroyMutex(queueLock_);
         tasks->DestroyMutex(portLock_);
     }
@@ -52,60 +54,51 @@ bool Protocol_XTOK::Configure(const char* text) {
         SetLastError(-1, config_.GetLastError());
         return false;
     }
-    const XtokCommonParams& common = config_.GetCommon();
+    XtokCommonParams& common = config_.GetCommon();
     portName_ = common.port;
-    baud_ = common.baudrate;
-    bits_ = common.bits;
-    stop_ = common.stopbits;
-    int32_t code = 0;
-    if (!parityFromName(common.parity, code)) {
-        SetLastError(-1, "Parser: parameter 'parity' has invalid value");
-        return false;
+    for (const Setting& setting : kSettings) {
+        const SettingId id = setting.id;
+        const bool decoded = setting.spelledAs == SpelledAs::ParityName
+                                 ? parityFromName(common.text[id], common.number[id])
+                             : setting.spelledAs == SpelledAs::ModeName
+                                 ? modeFromName(common.text[id], common.number[id])
+                                 : true;
+        if (!decoded) {
+            SetLastError(
+                -1, std::string("Parser: parameter '") + setting.configKey + "' has invalid value");
+            return false;
+        }
+        // Set at Start for all but the line settings, which a reported
+        // settings text shows from now on.
+        if (setting.activation == Activation::PortReconfigure) {
+            active_[id] = common.number[id];
+        }
     }
-    parity_ = code;
-    if (!modeFromName(common.mode, code)) {
-        SetLastError(-1, "Parser: parameter 'mode' has invalid value");
-        return false;
-    }
-    mode_ = code;
     return true;
 }
 
 LineSettings Protocol_XTOK::lineSettings() const {
-    return LineSettings{baud_, parity_, bits_, stop_, mode_};
+    return LineSettings{active_[kBaud], active_[kParity], active_[kBits], active_[kStop],
+                        active_[kMode]};
 }
 
 bool Protocol_XTOK::openPort() {
     return port_.Open(portName_, lineSettings());
 }
 
+// The configured value of each setting is the default of its retained one.
 void Protocol_XTOK::loadRetainedSettings() {
-    settings_.setSection(GetInstanceName());
+    HostLock lock(queueLock_);
+    settings_.attach(services_.permanentStorage, GetInstanceName());
     const XtokCommonParams& common = config_.GetCommon();
-    auto retainInt = [this](const char* key, std::atomic<int32_t>& value, int32_t def) {
-        int32_t out = def;
-        settings_.getInt(key, -1, def, out);
-        value = out;
-    };
-    auto retainText = [this](const char* key, SharedText& value, const std::string& def) {
-        std::string out;
-        settings_.getText(key, -1, def, out);
-        value.set(out);
-    };
-    retainInt("baud", baud_, baud_);
-    retainInt("parity", parity_, parity_);
-    retainInt("bits", bits_, bits_);
-    retainInt("stop", stop_, stop_);
-    retainInt("mode", mode_, mode_);
-    retainText("rx_prefix", rxPrefix_, common.rx_prefix);
-    retainText("rx_suffix", rxSuffix_, common.rx_suffix);
-    retainText("tx_prefix", txPrefix_, common.tx_prefix);
-    retainText("tx_suffix", txSuffix_, common.tx_suffix);
-    retainInt("gap", gap_, common.gap);
-    bool hex = common.hex_tokens;
-    settings_.getBool("hex_tokens", -1, common.hex_tokens, hex);
-    hexTokens_ = hex;
-    retainInt("token_queue_size", tokenQueueSize_, common.token_queue_size);
+    for (const Setting& setting : kSettings) {
+        const SettingId id = setting.id;
+        if (setting.activation != Activation::PortReconfigure) {
+            makeActive(id, setting.kind == SettingKind::Hex ? StoredValue(common.text[id])
+                                                            : StoredValue(common.number[id]));
+        }
+        makeActive(id, settings_.get(setting.key, -1, activeValue(id)));
+    }
 }
 
 bool Protocol_XTOK::Start() {
@@ -130,20 +123,29 @@ bool Protocol_XTOK::Stop() {
     if (!started_) {
         return true;
     }
-    bool ended = task_.StopTask(1000);
-    if (connected_) {
-        if (ended) {
-            port_.Close();
-            connected_ = false;
-        } else {
-            // The task still runs: let it see the port go between two bytes.
-            connected_ = false;
-            HostLock lock(portLock_);
-            port_.Close();
-        }
-    }
+    // Should the task not end in time, the close still waits for its read.
+    task_.StopTask(1000);
+    HostLock lock(queueLock_);
+    setConnected(false);
     started_ = false;
     return true;
+}
+
+bool Protocol_XTOK::setConnected(bool on) {
+    if (!on) {
+        // Cleared before waiting for portLock: the receive task ends its
+        // pass at the next byte instead of reading on.
+        if (connected_.exchange(false)) {
+            HostLock port(portLock_);
+            port_.Close();
+        }
+        return true;
+    }
+    HostLock port(portLock_);
+    if (!connected_) {
+        connected_ = openPort();
+    }
+    return connected_;
 }
 
 const char* Protocol_XTOK::GetXmlDescription() {

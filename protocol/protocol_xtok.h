@@ -2,6 +2,7 @@
 // strings ("tokens") with the device on it, through tags on its memory types.
 #pragma once
 
+#include <array>
 #include <atomic>
 #include <cstdint>
 #include <string>
@@ -9,10 +10,11 @@
 
 #include "framework/memory_type.h"
 #include "framework/protocol_base.h"
+#include "module/service_table.h"
 #include "protocol/receive_task.h"
 #include "protocol/retained_store.h"
 #include "protocol/serial_port.h"
-#include "protocol/spin_lock.h"
+#include "protocol/settings.h"
 #include "protocol/staged_store.h"
 #include "protocol/token_queue.h"
 #include "protocol/xtok_config.h"
@@ -23,14 +25,14 @@ class XtokTag;
 
 /// Threads: Configure, Start, Stop and destruction come from the runtime's
 /// management thread; tag reads, writes and console commands from any
-/// runtime thread; receiveToken from the receive task. queueLock guards the
-/// queue and SP_Done, portLock each byte read and every open or close while
-/// the task runs; when both are held, queueLock is taken first. The flags,
-/// numbers and framing texts shared without a host lock are atomics or
-/// SharedText, so a change takes effect at the next byte or token.
+/// runtime thread; receiveToken from the receive task. Two host mutexes:
+/// queueLock guards the queue, the settings stores, the framing texts and
+/// every use of the port but the byte reads; portLock guards each byte read
+/// and every open and close. When both are held, queueLock is taken first.
+/// Numbers and flags are single-word atomics, read without a lock.
 class Protocol_XTOK final : public ProtocolBase {
 public:
-    Protocol_XTOK();
+    explicit Protocol_XTOK(const ServiceTable& services);
     ~Protocol_XTOK() override;
 
     void* GetInterface(const char* name) override;
@@ -70,40 +72,52 @@ private:
     void loadRetainedSettings();
     LineSettings lineSettings() const;
     bool openPort();
+    /// Opens or closes the port, taking portLock; the caller holds
+    /// queueLock. False when an open failed.
+    bool setConnected(bool on);
 
     // Receiving.
     enum class ReadResult { Byte, Timeout, Disconnected };
     void pushToken(const char* bytes, std::size_t length);
-    /// One byte into `byte`, with portLock_ held around the read the way
-    /// `portLock` holds it (see receive_framing.cpp).
-    template <class Lock>
-    ReadResult readByteLocked(const Lock& portLock, uint8_t* byte, int32_t timeoutMs);
+    ReadResult readByte(uint8_t* byte, int32_t timeoutMs);
+    /// A pass that reads only while connected.
+    void receiveFramed(const std::string& prefix, const std::string& suffix, int32_t timeout);
+
+    // Settings, with queueLock held.
+    StoredValue activeValue(SettingId id) const;
+    void makeActive(SettingId id, const StoredValue& value);
+    /// A setting as the SP_ types see it: the staged value while SP_Done
+    /// has not applied it, else the retained one, else the active value of
+    /// `fallback`.
+    StoredValue settingValue(const Setting& setting, SettingId fallback);
+    void applyStagedSettings();
 
     // Reads and writes of the memory types.
     bool readMemoryType(XtokTag& tag, int32_t element, uint8_t* buffer);
     bool readSettingsType(XtokTag& tag, uint8_t* buffer);
     bool readTokenType(XtokTag& tag, uint8_t* buffer);
-    /// A setting as the SP_ types see it: the staged value while SP_Done
-    /// has not applied it, else the retained one, else `active`.
-    int32_t settingInt(const char* key, int32_t active);
-    bool settingBool(const char* key, bool active);
-    std::string settingText(const char* key, const std::string& active);
     /// `available`: bytes of the value from `value` on.
     bool writeMemoryType(XtokTag& tag, int32_t element, const uint8_t* value, int32_t available);
-    bool stageSetting(XtokTag& tag, const uint8_t* value, int32_t available);
+    bool stageSetting(const Setting& setting, const uint8_t* value, int32_t available);
     bool writeConnect(const uint8_t* value, int32_t available);
+    enum class Sent { Ok, NotHex, NotConnected };
+    /// Frames and writes a token (hex text in hex mode); a failed write is
+    /// not reported. The caller holds queueLock.
+    Sent send(const std::string& text);
     bool transmit(const std::string& text);
-    void applyStagedSettings();
     bool partialRead(XtokTag& tag, int32_t index, int32_t count, int32_t offset, int32_t rawSize,
                      int32_t elementSize, uint8_t* scratch);
 
     // Console.
     bool driverCommand(const std::vector<std::string>& words, const char* line, char* reply,
                        int32_t size, bool& handled);
+    bool queueCommand(const std::vector<std::string>& words, char* reply, int32_t size,
+                      bool& handled);
     bool consoleConnect(const std::vector<std::string>& words, char* reply, int32_t size);
     bool consolePut(const char* line, char* reply, int32_t size);
-    bool consoleSet(const std::string& cmd, const std::string& value, char* reply, int32_t size);
+    bool consoleSet(const Setting& setting, const std::string& value, char* reply, int32_t size);
 
+    const ServiceTable& services_;
     ReceiveTask task_;
     std::atomic<bool> started_{false};  // read by the runtime's threads
     XtokConfig config_;
@@ -111,19 +125,13 @@ private:
     RetainedStore settings_;
     StagedStore stagedSettings_;
     TokenQueue tokens_;
-    SharedText rxPrefix_, rxSuffix_, txPrefix_, txSuffix_;
-    std::atomic<int32_t> gap_{0};
-    std::atomic<bool> hexTokens_{false};
-    std::atomic<int32_t> tokenQueueSize_{100};
-    std::string frame_;  ///< the receive task's frame under collection, reused
-    /// The receive task's framing bytes, converted from rxPrefix_ and
-    /// rxSuffix_ again whenever those texts have changed (their versions).
-    struct FramingBytes {
-        std::string bytes;
-        uint32_t version = ~uint32_t{0};
-    } rxPrefixBytes_, rxSuffixBytes_;
+    /// Active values of the numbers, flags and codes, by setting.
+    std::array<std::atomic<int32_t>, kSettingCount> active_{};
+    /// Active values of the hex texts, by setting.
+    std::array<std::string, kSettingCount> activeText_;
+    std::string frame_;                ///< the receive task's frame under collection, reused
+    std::string rxPrefix_, rxSuffix_;  ///< the receive task's framing bytes, reused
     std::string portName_;
-    std::atomic<int32_t> baud_{0}, bits_{0}, stop_{0}, parity_{0}, mode_{0};
     SerialPort port_;
     IMutex* queueLock_ = nullptr;
     IMutex* portLock_ = nullptr;

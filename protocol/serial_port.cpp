@@ -1,7 +1,5 @@
 #include "protocol/serial_port.h"
 
-#include <thread>
-
 namespace xtok {
 
 namespace {
@@ -61,36 +59,20 @@ bool SerialPort::Open(const std::string& name, const LineSettings& line) {
 }
 
 void SerialPort::Close() {
-    ISerialPort* port = handle_.exchange(nullptr);
-    if (!port) {
-        return;
+    if (ISerialPort* port = handle_.exchange(nullptr)) {
+        factory_->Close(port);
     }
-    while (users_.load() != 0) {
-        std::this_thread::yield();
-    }
-    factory_->Close(port);
-}
-
-template <class Use>
-bool SerialPort::withPort(Use use) {
-    users_.fetch_add(1);
-    ISerialPort* port = handle_.load();
-    bool ok = port && use(port);
-    users_.fetch_sub(1);
-    return ok;
 }
 
 bool SerialPort::Reconfigure(const LineSettings& line) {
-    return withPort([&line](ISerialPort* port) {
-        return port->Configure(line.baud, line.parity, line.bits, line.stop, line.mode);
-    });
+    ISerialPort* port = handle_.load();
+    return port && port->Configure(line.baud, line.parity, line.bits, line.stop, line.mode);
 }
 
 bool SerialPort::Write(const std::string& frame) {
-    return withPort([&frame](ISerialPort* port) {
-        return port->Write(reinterpret_cast<const uint8_t*>(frame.data()),
-                           static_cast<int32_t>(frame.size()), 0);
-    });
+    ISerialPort* port = handle_.load();
+    return port && port->Write(reinterpret_cast<const uint8_t*>(frame.data()),
+                               static_cast<int32_t>(frame.size()), 0);
 }
 
 }  // namespace xtok

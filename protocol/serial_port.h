@@ -37,33 +37,30 @@ public:
     SerialPort(const SerialPort&) = delete;
     SerialPort& operator=(const SerialPort&) = delete;
 
+    // Open, Close, Reconfigure and Write run with queueLock held (Open and
+    // Close with portLock too), or before the receive task starts; ReadByte
+    // with portLock held. So no call finds the port freed under it.
+
     /// Opens and configures; a port whose settings the host refuses is
     /// closed again and the open fails.
     bool Open(const std::string& name, const LineSettings& line);
     void Close();
     bool IsOpen() const { return handle_.load() != nullptr; }
     /// Applies new settings to the open port; false when closed or refused.
-    /// Takes no lock, like Write.
     bool Reconfigure(const LineSettings& line);
 
-    /// One byte with a time-out. The caller holds the lock that keeps
-    /// Open and Close away (the receive task's portLock).
+    /// One byte with a time-out.
     bool ReadByte(uint8_t* destination, int32_t timeoutMs) {
         ISerialPort* port = handle_.load(std::memory_order_acquire);
         return port && port->ReadByte(destination, timeoutMs, 0);
     }
-    /// Sends a frame. Transmits take no lock, so a close waits until a
-    /// write that already holds the handle has finished with it.
+    /// Sends a frame; false when closed or the write failed.
     bool Write(const std::string& frame);
 
 private:
-    /// Runs `use` on the open port, keeping Close from freeing it meanwhile.
-    template <class Use>
-    bool withPort(Use use);
-
     ISerialFactory* factory_;
+    // Atomic because IsOpen is asked without a lock.
     std::atomic<ISerialPort*> handle_{nullptr};
-    std::atomic<int> users_{0};
 };
 
 }  // namespace xtok

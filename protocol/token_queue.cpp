@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "protocol/hex_text.h"
+#include "xtokline/text.h"
 
 namespace xtok {
 
@@ -16,7 +16,6 @@ constexpr std::size_t kFirstRing = 16;
 }  // namespace
 
 void TokenQueue::push(const char* bytes, std::size_t length, int32_t limit, bool hex) {
-    std::lock_guard<SpinLock> guard(guard_);
     if (static_cast<int64_t>(count_) >= limit) {
         dropHead();
     }
@@ -36,7 +35,6 @@ void TokenQueue::push(const char* bytes, std::size_t length, int32_t limit, bool
 }
 
 void TokenQueue::removeHead() {
-    std::lock_guard<SpinLock> guard(guard_);
     dropHead();
 }
 
@@ -53,7 +51,6 @@ void TokenQueue::dropHead() {
 }
 
 void TokenQueue::clear() {
-    std::lock_guard<SpinLock> guard(guard_);
     std::vector<std::string>().swap(ring_);
     head_ = 0;
     count_ = 0;

@@ -1,7 +1,7 @@
 #include "protocol/xtok_config.h"
 
 #include "params/param_parser.h"
-#include "protocol/hex_text.h"
+#include "xtokline/text.h"
 
 namespace xtok {
 
@@ -31,43 +31,51 @@ bool XtokConfig::Parse(const std::string& configText) {
     return readCommon(parser);
 }
 
+bool XtokConfig::readSetting(ParamParser& parser, const Setting& setting) {
+    const int common = PARAM_NODE_INDEPENDENT;
+    const bool optional = !setting.mandatory;
+    const SettingId id = setting.id;
+    common_.number[id] = setting.defaultValue;
+    if (setting.kind == SettingKind::Hex || setting.spelledAs != SpelledAs::Number) {
+        return getParamString(parser, setting.configKey, -1, common_.text[id], common, optional,
+                              errorText_);
+    }
+    if (setting.kind == SettingKind::Flag) {
+        bool flag = setting.defaultValue != 0;
+        bool ok = getParamBool(parser, setting.configKey, -1, flag, common, optional, errorText_);
+        common_.number[id] = flag;
+        return ok;
+    }
+    return getParamInt(parser, setting.configKey, -1, common_.number[id], common, optional,
+                       errorText_);
+}
+
 bool XtokConfig::readCommon(ParamParser& parser) {
     const int common = PARAM_NODE_INDEPENDENT;
-    std::string& e = errorText_;
-    XtokCommonParams& c = common_;
-    bool ok = getParamString(parser, "port", -1, c.port, common, false, e) &&
-              getParamInt(parser, "baudrate", -1, c.baudrate, common, false, e) &&
-              getParamString(parser, "parity", -1, c.parity, common, false, e) &&
-              getParamInt(parser, "bits", -1, c.bits, common, false, e) &&
-              getParamInt(parser, "stopbits", -1, c.stopbits, common, false, e) &&
-              getParamString(parser, "mode", -1, c.mode, common, false, e) &&
-              getParamString(parser, "rx_prefix", -1, c.rx_prefix, common, true, e) &&
-              getParamString(parser, "rx_suffix", -1, c.rx_suffix, common, true, e) &&
-              getParamInt(parser, "gap", -1, c.gap, common, true, e) &&
-              getParamString(parser, "tx_prefix", -1, c.tx_prefix, common, true, e) &&
-              getParamString(parser, "tx_suffix", -1, c.tx_suffix, common, true, e) &&
-              getParamBool(parser, "hex_tokens", -1, c.hex_tokens, common, true, e) &&
-              getParamInt(parser, "token_queue_size", -1, c.token_queue_size, common, true, e);
-    if (!ok) {
+    if (!getParamString(parser, "port", -1, common_.port, common, false, errorText_)) {
         return false;
     }
-    // The range check comes before the hex checks, so it wins when both fail.
-    if (c.token_queue_size < 1 || c.token_queue_size > 10000) {
-        e = "parameter 'token_queue_size' out of range";
+    for (const Setting& setting : kSettings) {
+        if (!readSetting(parser, setting)) {
+            return false;
+        }
+    }
+    // The range checks come before the hex checks, so they win when both fail.
+    for (const Setting& setting : kSettings) {
+        const int32_t value = common_.number[setting.id];
+        if (setting.editorLow != setting.editorHigh &&
+            (value < setting.editorLow || value > setting.editorHigh)) {
+            errorText_ = std::string("parameter '") + setting.configKey + "' out of range";
+            return false;
+        }
+    }
+    common_.autoConnect = true;
+    if (!getParamBool(parser, "autoConnect", -1, common_.autoConnect, common, true, errorText_)) {
         return false;
     }
-    c.autoConnect = true;
-    if (!getParamBool(parser, "autoConnect", -1, c.autoConnect, common, true, e)) {
-        return false;
-    }
-    const std::pair<const std::string*, const char*> framing[] = {
-        {&c.rx_prefix, "rx_prefix not in hex format"},
-        {&c.rx_suffix, "rx_suffix not in hex format"},
-        {&c.tx_prefix, "tx_prefix not in hex format"},
-        {&c.tx_suffix, "tx_suffix not in hex format"}};
-    for (const auto& [text, message] : framing) {
-        if (!isHexText(*text)) {
-            e = message;
+    for (const Setting& setting : kSettings) {
+        if (setting.kind == SettingKind::Hex && !isHexText(common_.text[setting.id])) {
+            errorText_ = std::string(setting.configKey) + " not in hex format";
             return false;
         }
     }

@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+#include "protocol/settings.h"
+
 namespace xtok {
 
 class ParamParser;
@@ -15,21 +17,14 @@ struct XtokNode {
     std::string model = "1";
 };
 
-/// The common parameters, with the defaults of the optional ones.
+/// The common parameters: the port, each setting's configured value (the
+/// active value at Start unless a retained one overrides it) and autoConnect.
 struct XtokCommonParams {
     std::string port;
-    int32_t baudrate = 0;
-    std::string parity;
-    int32_t bits = 0;
-    int32_t stopbits = 0;
-    std::string mode;
-    std::string rx_prefix;
-    std::string rx_suffix;
-    int32_t gap = 0;
-    std::string tx_prefix;
-    std::string tx_suffix;
-    bool hex_tokens = false;
-    int32_t token_queue_size = 100;
+    /// Numbers, flags (0 or 1) and, after Configure, parity and mode codes.
+    int32_t number[kSettingCount] = {};
+    /// Hex texts, and parity and mode as named in the text.
+    std::string text[kSettingCount];
     bool autoConnect = true;
 };
 
@@ -48,6 +43,7 @@ public:
 
 private:
     bool readCommon(ParamParser& parser);
+    bool readSetting(ParamParser& parser, const Setting& setting);
 
     XtokNode defaultNode_;
     std::vector<XtokNode> nodes_;

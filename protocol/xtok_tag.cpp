@@ -6,9 +6,9 @@
 #include <new>
 #include <vector>
 
-#include "params/text.h"
 #include "protocol/protocol_xtok.h"
 #include "protocol/token_model.h"
+#include "xtokline/text.h"
 
 namespace xtok {
 
@@ -17,16 +17,9 @@ namespace {
 // Decimal, "0x" hexadecimal or leading-zero octal; stops at the first
 // character that does not fit; out of range clamps.
 int32_t nodeNumber(const std::string& field) {
-    int saved = errno;
-    long long value = std::strtoll(field.c_str(), nullptr, 0);
-    errno = saved;
-    if (value > INT32_MAX) {
-        return INT32_MAX;
-    }
-    if (value < INT32_MIN) {
-        return INT32_MIN;
-    }
-    return static_cast<int32_t>(value);
+    int32_t number = 0;
+    parseClamped(field, 0, number);
+    return number;
 }
 
 const MemoryType* findMemoryType(const Model& model, const std::string& name) {

@@ -35,4 +35,8 @@ private:
     bool isSettingsTag_ = false;
 };
 
+/// The text of a value written to a tag: up to its first zero byte, and
+/// never past the `available` bytes the tag holds, which need not contain one.
+std::string takeText(const uint8_t* value, int32_t available);
+
 }  // namespace xtok

@@ -1,23 +1,11 @@
 #include "tools/byte_text.h"
 
 #include <cstdio>
+#include "xtokline/text.h"
 
 namespace xtok::tools {
 
 namespace {
-
-int hexDigit(char c) {
-    if (c >= '0' && c <= '9') {
-        return c - '0';
-    }
-    if (c >= 'a' && c <= 'f') {
-        return c - 'a' + 10;
-    }
-    if (c >= 'A' && c <= 'F') {
-        return c - 'A' + 10;
-    }
-    return -1;
-}
 
 char simpleEscape(char c) {
     switch (c) {
@@ -40,7 +28,7 @@ char simpleEscape(char c) {
 
 }  // namespace
 
-std::string escapeBytes(const std::string& bytes) {
+std::string escapeBytes(const std::string& bytes, const char* otherEscape) {
     std::string text;
     for (char c : bytes) {
         unsigned char byte = static_cast<unsigned char>(c);
@@ -56,8 +44,8 @@ std::string escapeBytes(const std::string& bytes) {
         } else if (byte >= 0x20 && byte < 0x7F) {
             text += c;
         } else {
-            char escape[5];
-            std::snprintf(escape, sizeof escape, "\\x%02X", byte);
+            char escape[8];
+            std::snprintf(escape, sizeof escape, otherEscape, byte);
             text += escape;
         }
     }
@@ -96,8 +84,8 @@ bool unescapeBytes(const std::string& text, std::string& bytes, std::string& err
             bytes += c;
             continue;
         }
-        int high = i + 1 < text.size() ? hexDigit(text[i + 1]) : -1;
-        int low = i + 2 < text.size() ? hexDigit(text[i + 2]) : -1;
+        int high = i + 1 < text.size() ? hexDigitValue(text[i + 1]) : -1;
+        int low = i + 2 < text.size() ? hexDigitValue(text[i + 2]) : -1;
         if (high < 0 || low < 0) {
             error = "\\x needs two hex digits";
             return false;

@@ -7,8 +7,9 @@
 namespace xtok::tools {
 
 /// Printable ASCII as it is; backslash, double quote and every other byte as
-/// an escape (\\, \", \n, \r, \t, \xHH). unescapeBytes reverses it.
-std::string escapeBytes(const std::string& bytes);
+/// an escape (\\, \", \n, \r, \t, then `otherEscape` with the byte, \xHH by
+/// default). unescapeBytes reverses the default form.
+std::string escapeBytes(const std::string& bytes, const char* otherEscape = "\\x%02X");
 
 /// "41 42 03": two upper-case digits per byte, blank-separated.
 std::string hexBytes(const std::string& bytes);

@@ -3,9 +3,11 @@
 #include <cstdlib>
 #include <ostream>
 
+#include "protocol/settings.h"
 #include "tools/interrupt.h"
 #include "tools/json_line.h"
 #include "tools/token_view.h"
+#include "xtokline/text.h"
 
 namespace xtok::tools {
 
@@ -33,26 +35,25 @@ const char* const kHostHelp =
     "Any other line goes to the plug-in's console, whose read and write take\n"
     "raw hex data:\n";
 
-// The settings tags in the order a person reads a line setup. Strings are
-// sized for any prefix an operator would configure.
-struct SettingTag {
-    const char* name;
-    const char* address;
-};
-const SettingTag kSettings[] = {
-    {"SP_Baud", "0?SP_Baud?unsignedInt"},
-    {"SP_Par", "0?SP_Par?unsignedByte"},
-    {"SP_Bits", "0?SP_Bits?unsignedByte"},
-    {"SP_Stop", "0?SP_Stop?unsignedByte"},
-    {"SP_Mode", "0?SP_Mode?unsignedByte"},
-    {"SP_RxPrefix", "0?SP_RxPrefix?string-256"},
-    {"SP_RxSuffix", "0?SP_RxSuffix?string-256"},
-    {"SP_TxPrefix", "0?SP_TxPrefix?string-256"},
-    {"SP_TxSuffix", "0?SP_TxSuffix?string-256"},
-    {"SP_Gap", "0?SP_Gap?unsignedInt"},
-    {"SP_HexTokens", "0?SP_HexTokens?boolean"},
-    {"SP_TokenQueueSize", "0?SP_TokenQueueSize?unsignedInt"},
-};
+// The address that reads a setting's SP_ memory type. Texts are sized for
+// any prefix an operator would configure.
+std::string settingAddress(const Setting& setting) {
+    const char* type = "string-256";
+    switch (setting.kind) {
+        case SettingKind::Number:
+            type = "unsignedInt";
+            break;
+        case SettingKind::Byte:
+            type = "unsignedByte";
+            break;
+        case SettingKind::Flag:
+            type = "boolean";
+            break;
+        case SettingKind::Hex:
+            break;
+    }
+    return std::string("0?") + setting.memoryType + "?" + type;
+}
 
 std::vector<std::string> splitWords(const std::string& line) {
     std::vector<std::string> words;
@@ -63,14 +64,6 @@ std::vector<std::string> splitWords(const std::string& line) {
         at = end;
     }
     return words;
-}
-
-std::string trimmed(const std::string& text) {
-    std::size_t first = text.find_first_not_of(" \t\r\n");
-    if (first == std::string::npos) {
-        return "";
-    }
-    return text.substr(first, text.find_last_not_of(" \t\r\n") - first + 1);
 }
 
 /// What follows the first `skip` words of `line`, as typed.
@@ -136,7 +129,7 @@ bool ConsoleSession::run(LineInput& input) {
 }
 
 bool ConsoleSession::execute(const std::string& raw) {
-    std::string line = trimmed(raw);
+    std::string line = trimmed(raw, kWhiteSpace);
     if (line.empty() || line[0] == '#') {
         return true;
     }
@@ -290,10 +283,10 @@ bool ConsoleSession::settings(const std::string& line) {
     JsonLine json;
     json.text("command", line).flag("ok", true).text("active", active);
     std::string text = "active line        " + std::string(active) + "\n";
-    for (const SettingTag& setting : kSettings) {
+    for (const Setting& setting : kSettings) {
         TagValue value;
         std::string error;
-        if (!session_.read(setting.address, value, error)) {
+        if (!session_.read(settingAddress(setting), value, error)) {
             return fail(line, error);
         }
         // Prefixes and suffixes are hex texts already: shown as they stand.
@@ -301,10 +294,10 @@ bool ConsoleSession::settings(const std::string& line) {
         std::string shown =
             isText ? stringValue(value.bytes) : formatValue(value.shape, value.bytes);
         shown = isText && shown.empty() ? "(none)" : shown;
-        std::string name = codeName(setting.name, value.bytes.empty() ? 0 : value.bytes[0]);
-        json.raw(setting.name, formatValueJson(value.shape, value.bytes));
-        text += std::string(setting.name) +
-                std::string(19 - std::string(setting.name).size(), ' ') + shown +
+        std::string name = codeName(setting.memoryType, value.bytes.empty() ? 0 : value.bytes[0]);
+        json.raw(setting.memoryType, formatValueJson(value.shape, value.bytes));
+        text += std::string(setting.memoryType) +
+                std::string(19 - std::string(setting.memoryType).size(), ' ') + shown +
                 (name.empty() ? "" : " (" + name + ")") + "\n";
     }
     text += "SP_ values written here wait for SP_Done, which applies and keeps them.\n";
@@ -317,7 +310,7 @@ bool ConsoleSession::passOn(const std::string& line) {
     std::string reply = session_.command(line, ok);
     if (!ok) {
         // The consoles begin their error replies with the word; it is said already.
-        std::string why = trimmed(reply);
+        std::string why = trimmed(reply, kWhiteSpace);
         for (const char* lead : {"ERROR: ", "error: "}) {
             if (why.rfind(lead, 0) == 0) {
                 why.erase(0, std::string(lead).size());

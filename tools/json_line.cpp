@@ -1,31 +1,13 @@
 #include "tools/json_line.h"
 
+#include "tools/byte_text.h"
+
 #include <cstdio>
 
 namespace xtok::tools {
 
 std::string jsonString(const std::string& bytes) {
-    std::string out = "\"";
-    for (char c : bytes) {
-        unsigned char byte = static_cast<unsigned char>(c);
-        if (c == '"' || c == '\\') {
-            out += '\\';
-            out += c;
-        } else if (c == '\n') {
-            out += "\\n";
-        } else if (c == '\r') {
-            out += "\\r";
-        } else if (c == '\t') {
-            out += "\\t";
-        } else if (byte < 0x20 || byte >= 0x7F) {
-            char escape[8];
-            std::snprintf(escape, sizeof escape, "\\u%04x", byte);
-            out += escape;
-        } else {
-            out += c;
-        }
-    }
-    return out + "\"";
+    return "\"" + escapeBytes(bytes, "\\u%04x") + "\"";
 }
 
 void JsonLine::key(const std::string& name) {

@@ -1,6 +1,7 @@
 #include "tools/xml_scan.h"
 
 #include <cctype>
+#include "xtokline/text.h"
 
 namespace xtok::tools {
 
@@ -27,13 +28,6 @@ std::string decodeEntities(const std::string& text) {
     return out;
 }
 
-std::string trimmed(const std::string& text) {
-    std::size_t first = text.find_first_not_of(" \t\r\n");
-    return first == std::string::npos
-               ? ""
-               : text.substr(first, text.find_last_not_of(" \t\r\n") - first + 1);
-}
-
 bool isSpace(char c) {
     return std::isspace(static_cast<unsigned char>(c)) != 0;
 }
@@ -57,7 +51,7 @@ bool parseAttributes(const std::string& inside, std::map<std::string, std::strin
         if ((quote != '"' && quote != '\'') || close == std::string::npos) {
             return false;
         }
-        attributes[trimmed(inside.substr(i, equals - i))] =
+        attributes[trimmed(inside.substr(i, equals - i), kWhiteSpace)] =
             decodeEntities(inside.substr(equals + 2, close - equals - 2));
         i = close + 1;
     }
@@ -101,7 +95,7 @@ bool scanXml(const std::string& xml, std::vector<XmlElement>& elements, std::str
             return false;
         }
         std::size_t next = xml.find('<', end + 1);
-        element.text = decodeEntities(trimmed(xml.substr(end + 1, next - end - 1)));
+        element.text = decodeEntities(trimmed(xml.substr(end + 1, next - end - 1), kWhiteSpace));
         if (!empty) {
             open.push_back(element.name);
         }
