@@ -19,7 +19,7 @@ HERE = os.path.dirname(os.path.abspath(__file__))
 PYTHON = "/usr/bin/python3"  # Debian's, where python3-serial is
 GEN_NICE = 10
 # Readers that run on some workloads only.
-ONLY = {"xtokline-scan1ms": ("linerate",)}
+ONLY = {}
 
 WORKLOADS = {
     # name: (generator arguments, seconds the reader may take at most)
@@ -33,11 +33,8 @@ def readers(build):
     plugin = os.path.join(build, "libxtok.so")
     peers = os.path.join(HERE, "peers")
     return {
+        # A runtime's 1 ms scan cycle.
         "xtokline": [reader, plugin, "{device}", "{count}"],
-        # The same reader as a runtime with a fixed 1 ms scan cycle (line rate
-        # only: at saturation it is the first reader's batching).
-        "xtokline-scan1ms": [reader, plugin, "{device}", "{count}", "--wait", "poll",
-                             "--poll-us", "1000"],
         "pyserial-loop": [PYTHON, os.path.join(peers, "pyserial_reader.py"), "loop",
                           "{device}", "{count}"],
         "pyserial-framed": [PYTHON, os.path.join(peers, "pyserial_reader.py"), "framed",

@@ -135,8 +135,7 @@ def table(summary, errors):
                  "CPU is the reader's process (user + system, all threads) from its first "
                  "data to its last token. Latency: the reader's application sees the token, "
                  "less the generator's time stamp. \"Best peer\" is the best of the other "
-                 "readers in that column; xtokline-scan1ms is ours too (the same reader "
-                 "as a runtime that looks every millisecond) and no peer.")
+                 "readers in that column.")
     if errors:
         lines.append("")
         lines.append("Runs that failed: " + "; ".join(

@@ -10,7 +10,7 @@
 // MODE is one of prefix+suffix, suffix, prefix, gap (no prefix, no suffix).
 //
 // The protocol is the real one (the plug-in's code, linked statically), its
-// locks are the host's RecursiveMutex, and its port serves bytes through the
+// locks are the host's mutex, and its port serves bytes through the
 // host's ReadBuffer exactly as the host's SerialPort does, refilled from
 // memory in 4 KiB pieces where the host calls read(2). Only the task is left
 // out: the benchmark's thread runs the receive passes itself.
@@ -205,7 +205,7 @@ public:
             std::fprintf(stderr, "module Init failed\n");
             std::exit(1);
         }
-        protocol_ = new Protocol_XTOK();
+        protocol_ = static_cast<Protocol_XTOK*>(rootObject().factory().CreateProtocol("XTOK"));
         std::string config = std::string("CfgVer=1 model=1 port=mem baudrate=115200 parity=none "
                                          "bits=8 stopbits=1 mode=RS-232 token_queue_size=10000 "
                                          "rx_prefix=") +
@@ -217,7 +217,7 @@ public:
     }
     ~Session() {
         protocol_->Stop();
-        delete protocol_;
+        rootObject().factory().DestroyProtocol(protocol_);
         rootObject().module().Exit();
     }
     Protocol_XTOK& protocol() { return *protocol_; }

@@ -3,19 +3,10 @@
 // protocol's slots: read tokens_available, then for each token read rx_token
 // and write token_ack.
 //
-//   xtok_reader PLUGIN DEVICE COUNT [--wait signal|poll] [--poll-us N]
-//               [--batch N] [--stream-us N] [--idle-ms N]
+//   xtok_reader PLUGIN DEVICE COUNT [--poll-us N] [--idle-ms N]
 //
-// How it waits between looks at tokens_available:
-//   signal (default)  on the host's task-yield signal (the receive task's
-//                     Sleep(0) after each pass), up to 10 ms, while tokens come
-//                     one at a time. They stream when a look finds --batch
-//                     tokens or more, or the next token arrives within
-//                     --stream-us of starting to wait; then it looks every
-//                     --poll-us (at once while a look finds 4 x --batch or
-//                     more), until a look finds fewer than a quarter of
-//                     --batch.
-//   poll              every --poll-us, like a runtime's fixed scan cycle.
+// Between looks at tokens_available it waits --poll-us (1000), a runtime's
+// fixed scan cycle; a look that finds tokens reads them all.
 //
 // Prints "ready" once the port is open and the receive task runs, then one
 // JSON line with the result (the fields of bench/token_check.h) once token
@@ -43,10 +34,7 @@ struct Options {
     std::string plugin;
     std::string device;
     uint32_t count = 0;
-    std::string wait = "signal";
     int pollUs = 1000;
-    uint32_t batch = 64;
-    int streamUs = 50;
     int idleMs = 1000;
 };
 
@@ -60,21 +48,15 @@ bool parse(int argc, char** argv, Options& o) {
     for (int i = 4; i + 1 < argc; i += 2) {
         std::string key = argv[i];
         const char* value = argv[i + 1];
-        if (key == "--wait") {
-            o.wait = value;
-        } else if (key == "--poll-us") {
+        if (key == "--poll-us") {
             o.pollUs = std::atoi(value);
-        } else if (key == "--batch") {
-            o.batch = static_cast<uint32_t>(std::atoi(value));
-        } else if (key == "--stream-us") {
-            o.streamUs = std::atoi(value);
         } else if (key == "--idle-ms") {
             o.idleMs = std::atoi(value);
         } else {
             return false;
         }
     }
-    return o.count > 0 && (o.wait == "signal" || o.wait == "poll");
+    return o.count > 0 && o.pollUs > 0;
 }
 
 void sleepUs(int us) {
@@ -88,8 +70,7 @@ int main(int argc, char** argv) {
     Options opt;
     if (!parse(argc, argv, opt)) {
         std::fprintf(stderr,
-                     "usage: xtok_reader PLUGIN DEVICE COUNT [--wait signal|poll] [--poll-us N] "
-                     "[--batch N] [--stream-us N] [--idle-ms N]\n");
+                     "usage: xtok_reader PLUGIN DEVICE COUNT [--poll-us N] [--idle-ms N]\n");
         return 2;
     }
 
@@ -126,16 +107,13 @@ int main(int argc, char** argv) {
         std::fprintf(stderr, "xtok_reader: %s\n", protocol->GetLastErrorText());
         return 1;
     }
-    host::MultiTask& tasks = services->multiTask();
     std::printf("ready\n");
     std::fflush(stdout);
 
     bench::TokenCheck check(opt.count);
     const uint8_t one = 1;
     char text[64];
-    uint32_t seenYields = tasks.taskYields();
     uint64_t lastDataNs = 0;
-    bool streaming = false;
     for (;;) {
         uint32_t n = 0;
         if (!protocol->ReadTag(available, &n)) {
@@ -159,36 +137,7 @@ int main(int argc, char** argv) {
             check.gaveUp();
             break;
         }
-        if (opt.wait == "poll") {
-            // A runtime's fixed scan cycle.
-            sleepUs(opt.pollUs);
-            continue;
-        }
-        // Event-driven while tokens come one at a time, batched while they
-        // stream: waking for each token would then cost more than the tokens
-        // themselves, so the next look is a scan cycle away.
-        if (streaming) {
-            if (n >= opt.batch / 4) {
-                // Several scan cycles' worth found: behind, look again at once.
-                if (n < 4 * opt.batch) {
-                    sleepUs(opt.pollUs);
-                }
-                continue;
-            }
-            streaming = false;  // a whole cycle brought next to nothing
-        } else if (n >= opt.batch) {
-            streaming = true;
-            continue;
-        }
-        // The host wakes us when a plug-in task ends a pass (its Sleep(0)
-        // after each token); the time-out is a plain scan.
-        const uint64_t waitFrom = bench::nowNs();
-        seenYields = tasks.waitForTaskYield(seenYields, 10);
-        if (n > 0 && bench::nowNs() - waitFrom < opt.streamUs * 1000ull) {
-            // The next token was already on its way: let them gather.
-            streaming = true;
-            sleepUs(opt.pollUs);
-        }
+        sleepUs(opt.pollUs);
     }
     std::printf("%s\n", check.json("xtokline").c_str());
     std::fflush(stdout);

@@ -1,7 +1,5 @@
 #include "host/multitask.h"
 
-#include <linux/futex.h>
-#include <sys/syscall.h>
 #include <time.h>
 #include <unistd.h>
 
@@ -10,7 +8,6 @@
 #include <system_error>
 #include <vector>
 
-#include "host/recursive_mutex.h"
 
 namespace xtok::host {
 
@@ -166,52 +163,41 @@ int MultiTask::liveTasks() const {
     return static_cast<int>(tasks_.size()) + stopping_;
 }
 
+namespace {
+
+/// The host's lock: the standard library's recursive mutex. A lock that no
+/// other thread wants costs one uncontended atomic operation each way.
+class Mutex final : public IMutex {
+public:
+    // Freed by DestroyMutex only.
+    void* Destroy(unsigned) override { return this; }
+    void Lock() override { mutex_.lock(); }
+    bool TryLock() override { return mutex_.try_lock(); }
+    void Unlock() override { mutex_.unlock(); }
+
+private:
+    std::recursive_mutex mutex_;
+};
+
+}  // namespace
+
 IMutex* MultiTask::CreateMutex(int32_t) {
-    return new (std::nothrow) RecursiveMutex();
+    return new (std::nothrow) Mutex();
 }
 
 void MultiTask::DestroyMutex(IMutex* mutex) {
-    delete static_cast<RecursiveMutex*>(mutex);
+    delete static_cast<Mutex*>(mutex);
 }
 
 void MultiTask::Sleep(int32_t ms) {
-    if (ms <= 0) {
-        // Both sequentially consistent, against those of waitForTaskYield: a
-        // waiter either sees the new count or is seen here and woken.
-        yields_.fetch_add(1);
-        if (yieldWaiters_.load() > 0) {
-            syscall(SYS_futex, reinterpret_cast<uint32_t*>(&yields_), FUTEX_WAKE_PRIVATE, INT_MAX,
-                    nullptr, nullptr, 0);
-        }
-        // Nothing more. On the panel, Sleep(0) hands the rest of a time
-        // slice to threads of the same priority, which a strict-priority
-        // scheduler would not run otherwise. Here every task is an ordinary
-        // thread that the scheduler preempts and shares out anyway, and the
-        // plug-in's receive task says Sleep(0) after every token: giving up
-        // the processor each time only cost a system call per token and moved
-        // the threads from one processor to the other at line rate.
-    } else {
+    // Sleep(0) does nothing here. On the panel it hands the rest of a time
+    // slice to threads of the same priority, which a strict-priority
+    // scheduler would not run otherwise; here every task is an ordinary
+    // thread that the scheduler shares out anyway, and the plug-in's receive
+    // task says Sleep(0) after every token.
+    if (ms > 0) {
         std::this_thread::sleep_for(std::chrono::milliseconds(ms));
     }
-}
-
-uint32_t MultiTask::waitForTaskYield(uint32_t seen, int32_t timeoutMs) {
-    static_assert(sizeof(std::atomic<uint32_t>) == sizeof(uint32_t), "a futex word is 32 bits");
-    const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(timeoutMs);
-    yieldWaiters_.fetch_add(1);
-    uint32_t now;
-    while ((now = yields_.load()) == seen) {
-        auto left = deadline - std::chrono::steady_clock::now();
-        if (left <= std::chrono::nanoseconds::zero()) {
-            break;
-        }
-        auto ns = std::chrono::duration_cast<std::chrono::nanoseconds>(left).count();
-        timespec relative{static_cast<time_t>(ns / 1000000000), static_cast<long>(ns % 1000000000)};
-        syscall(SYS_futex, reinterpret_cast<uint32_t*>(&yields_), FUTEX_WAIT_PRIVATE, seen,
-                &relative, nullptr, 0);
-    }
-    yieldWaiters_.fetch_sub(1);
-    return now;
 }
 
 }  // namespace xtok::host

@@ -71,14 +71,6 @@ public:
     /// Tasks created and not yet stopped successfully (started or not).
     int liveTasks() const;
 
-    /// How often a task has yielded (Sleep(0)); a plug-in's receive task
-    /// does so after each pass, so after each token. Wraps around.
-    uint32_t taskYields() const { return yields_.load(std::memory_order_acquire); }
-    /// For the runtime's tag scan: waits until taskYields() is no longer
-    /// `seen`, or `timeoutMs` has passed, and returns taskYields(). Costs the
-    /// yielding task nothing while nobody waits.
-    uint32_t waitForTaskYield(uint32_t seen, int32_t timeoutMs);
-
 private:
     std::unique_ptr<Task> take(ITask* task);
     /// Ends a StopTask: a handle still running goes back to the registry.
@@ -90,9 +82,6 @@ private:
     std::map<ITask*, std::unique_ptr<Task>> tasks_;
     // Handles taken out of tasks_ by a StopTask that is waiting on them.
     int stopping_ = 0;
-    // A futex word: counted by Sleep(0), waited on by waitForTaskYield.
-    std::atomic<uint32_t> yields_{0};
-    std::atomic<int> yieldWaiters_{0};
 };
 
 }  // namespace xtok::host
