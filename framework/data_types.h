@@ -6,39 +6,9 @@
 #include <string>
 #include <vector>
 
-namespace xtok {
+#include "xtokline/constants.h"
 
-/// Data type codes. A name ending in "-" is an array (or string) whose length
-/// follows it in the text.
-enum DataTypeCode : int32_t {
-    kBoolean = 1,
-    kByte = 2,
-    kShort = 3,
-    kInt = 4,
-    kUnsignedByte = 5,
-    kUnsignedShort = 6,
-    kUnsignedInt = 7,
-    kFloat = 8,
-    kDouble = 9,
-    kString = 10,
-    kBinary = 11,
-    kTime = 12,
-    kBooleanArray = 13,
-    kByteArray = 14,
-    kShortArray = 15,
-    kIntArray = 16,
-    kUnsignedByteArray = 17,
-    kUnsignedShortArray = 18,
-    kUnsignedIntArray = 19,
-    kFloatArray = 20,
-    kDoubleArray = 21,
-    kTimeArray = 22,
-    kUint64 = 23,
-    kInt64 = 24,
-    kUint64Array = 25,
-    kInt64Array = 26,
-    kObject = 27,
-};
+namespace xtok {
 
 /// The largest datum a data type text may describe, in bytes (in bits for
 /// the bit types). Far beyond any token or panel variable, and small enough

@@ -6,19 +6,13 @@
 
 #include <cstdint>
 #include <string>
+#include "xtokline/constants.h"
 
 struct sp_port;
 
 namespace xtok::host {
 
-/// The runtime's codes, as ISerialPort::Configure takes them.
-struct LineSettings {
-    int32_t baud;
-    int32_t parity;  // 0 none, 1 even, 2 odd, 3 mark, 4 space
-    int32_t bits;    // 5 to 8
-    int32_t stop;    // 1 or 2
-    int32_t mode;    // 0 RS-232, 1 RS-485, 2 RS-422, 3 RS-485P
-};
+using xtok::LineSettings;
 
 /// Each of these answers "" on success, else why not.
 std::string checkSettings(const LineSettings& settings);

@@ -2,17 +2,12 @@
 
 namespace xtok {
 
-namespace {
-const char* const kParityNames[] = {"none", "even", "odd", "mark", "space"};
-const char* const kModeNames[] = {"RS-232", "RS-485", "RS-422", "RS-485P"};
-}  // namespace
-
 const char* parityName(int32_t code) {
-    return code >= 0 && code < 5 ? kParityNames[code] : "none";
+    return code >= 0 && code < kParityCount ? kParityNames[code] : "none";
 }
 
 const char* modeName(int32_t code) {
-    return code >= 0 && code < 4 ? kModeNames[code] : "RS-232";
+    return code >= 0 && code < kModeCount ? kModeNames[code] : "RS-232";
 }
 
 bool parityFromName(const std::string& name, int32_t& code) {

@@ -6,18 +6,10 @@
 #include <cstdint>
 #include <string>
 
+#include "xtokline/constants.h"
 #include "xtokline/host.h"
 
 namespace xtok {
-
-/// Line settings as handed to the host: parity and mode as codes.
-struct LineSettings {
-    int32_t baud = 0;
-    int32_t parity = 0;  ///< 0 none, 1 even, 2 odd, 3 mark, 4 space
-    int32_t bits = 0;
-    int32_t stop = 0;
-    int32_t mode = 0;  ///< 0 RS-232, 1 RS-485, 2 RS-422, 3 RS-485P
-};
 
 /// Names for reports; unknown codes print as "none" and "RS-232".
 const char* parityName(int32_t code);

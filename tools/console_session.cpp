@@ -7,6 +7,7 @@
 #include "tools/interrupt.h"
 #include "tools/json_line.h"
 #include "tools/token_view.h"
+#include "xtokline/constants.h"
 #include "xtokline/text.h"
 
 namespace xtok::tools {
@@ -89,13 +90,11 @@ std::string restAfterWords(const std::string& line, int skip) {
 
 /// The name of a parity or mode code, as the configuration writes them.
 std::string codeName(const std::string& tag, unsigned code) {
-    static const char* const kParity[] = {"none", "even", "odd", "mark", "space"};
-    static const char* const kMode[] = {"RS-232", "RS-485", "RS-422", "RS-485P"};
-    if (tag == "SP_Par" && code < 5) {
-        return kParity[code];
+    if (tag == "SP_Par" && code < kParityCount) {
+        return kParityNames[code];
     }
-    if (tag == "SP_Mode" && code < 4) {
-        return kMode[code];
+    if (tag == "SP_Mode" && code < kModeCount) {
+        return kModeNames[code];
     }
     return "";
 }

@@ -10,6 +10,7 @@
 
 #include "tools/byte_text.h"
 #include "tools/json_line.h"
+#include "xtokline/constants.h"
 #include "xtokline/protocol.h"
 
 namespace xtok::tools {
@@ -17,11 +18,6 @@ namespace xtok::tools {
 namespace {
 
 enum class Kind { Bool, Signed, Unsigned, Float, Text, Hex, Unsupported };
-
-// Data type codes of the contract.
-constexpr int32_t kBoolean = 1, kByte = 2, kShort = 3, kInt = 4, kUnsignedByte = 5,
-                  kUnsignedShort = 6, kUnsignedInt = 7, kFloat = 8, kDouble = 9, kString = 10,
-                  kBinary = 11, kTime = 12, kUint64 = 23, kInt64 = 24;
 
 struct Element {
     Kind kind;

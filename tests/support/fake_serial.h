@@ -13,16 +13,11 @@
 #include <vector>
 
 #include "tests/support/fake_service.h"
+#include "xtokline/constants.h"
 
 namespace xtok::test {
 
-struct LineSettings {
-    int32_t baud, parity, bits, stop, mode;
-    bool operator==(const LineSettings& o) const {
-        return baud == o.baud && parity == o.parity && bits == o.bits && stop == o.stop &&
-               mode == o.mode;
-    }
-};
+using xtok::LineSettings;
 
 /// What happened on the line so far.
 struct LineRecord {
