@@ -221,7 +221,11 @@ bool ProtocolBase::CheckArrayItem(ITag* tag, int32_t index) {
     return true;
 }
 
-bool ProtocolBase::ReadWhole(ITag* tag, ScratchBuffer<256>& whole) {
+bool ProtocolBase::ReadWhole(ITag* tag, int32_t index, const void* value,
+                             ScratchBuffer<256>& whole) {
+    if (!CheckArrayItem(tag, index) || !value) {
+        return false;
+    }
     if (!whole.ok()) {
         SetLastError(-1, kNoMemoryText);
         return false;
@@ -230,11 +234,8 @@ bool ProtocolBase::ReadWhole(ITag* tag, ScratchBuffer<256>& whole) {
 }
 
 bool ProtocolBase::ReadArrayItem(ITag* tag, int32_t index, void* value) {
-    if (!CheckArrayItem(tag, index) || !value) {
-        return false;
-    }
-    ScratchBuffer<256> whole(tag->GetSize());
-    if (!ReadWhole(tag, whole)) {
+    ScratchBuffer<256> whole(tag ? tag->GetSize() : 0);
+    if (!ReadWhole(tag, index, value, whole)) {
         return false;
     }
     const int32_t width = elementSizeOf(*tag);
@@ -244,11 +245,8 @@ bool ProtocolBase::ReadArrayItem(ITag* tag, int32_t index, void* value) {
 
 // Writing one element rewrites the whole array on the device.
 bool ProtocolBase::WriteArrayItem(ITag* tag, int32_t index, const void* value) {
-    if (!CheckArrayItem(tag, index) || !value) {
-        return false;
-    }
-    ScratchBuffer<256> whole(tag->GetSize());
-    if (!ReadWhole(tag, whole)) {
+    ScratchBuffer<256> whole(tag ? tag->GetSize() : 0);
+    if (!ReadWhole(tag, index, value, whole)) {
         return false;
     }
     const int32_t width = elementSizeOf(*tag);

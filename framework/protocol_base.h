@@ -138,8 +138,9 @@ protected:
 
 private:
     bool CheckArrayItem(ITag* tag, int32_t index);
-    /// The whole tag, through ReadTag, into a buffer sized for it.
-    bool ReadWhole(ITag* tag, ScratchBuffer<256>& whole);
+    /// The whole array tag, through ReadTag, into a buffer sized for it, once
+    /// `index` is an element of it and an element `value` is given.
+    bool ReadWhole(ITag* tag, int32_t index, const void* value, ScratchBuffer<256>& whole);
     void ConsoleRead(const std::string& uri, char* reply, int32_t size);
     void ConsoleWrite(const std::string& uri, const std::string& hex, char* reply, int32_t size);
 

@@ -10,10 +10,12 @@ const char* modeName(int32_t code) {
     return code >= 0 && code < kModeCount ? kModeNames[code] : "RS-232";
 }
 
-bool parityFromName(const std::string& name, int32_t& code) {
-    // "space" exists only on the reporting side.
-    for (int32_t i = 0; i < 4; ++i) {
-        if (name == kParityNames[i]) {
+namespace {
+
+// The code of `name` among the first `count` names.
+bool codeOf(const std::string& name, const char* const* names, int32_t count, int32_t& code) {
+    for (int32_t i = 0; i < count; ++i) {
+        if (name == names[i]) {
             code = i;
             return true;
         }
@@ -21,15 +23,15 @@ bool parityFromName(const std::string& name, int32_t& code) {
     return false;
 }
 
+}  // namespace
+
+// "space" and "RS-485P" exist only on the reporting side.
+bool parityFromName(const std::string& name, int32_t& code) {
+    return codeOf(name, kParityNames, 4, code);
+}
+
 bool modeFromName(const std::string& name, int32_t& code) {
-    // "RS-485P" exists only on the reporting side.
-    for (int32_t i = 0; i < 3; ++i) {
-        if (name == kModeNames[i]) {
-            code = i;
-            return true;
-        }
-    }
-    return false;
+    return codeOf(name, kModeNames, 3, code);
 }
 
 std::string settingsText(const std::string& port, const LineSettings& line) {
