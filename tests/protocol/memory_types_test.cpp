@@ -29,21 +29,32 @@ TEST_F(MemoryTypes, EveryTypeReadsItsValue) {
         "rx_prefix=0D rx_suffix=0A gap=25 tx_prefix=02 tx_suffix=03 token_queue_size=7"));
     ASSERT_TRUE(protocol->Start());
     const std::vector<std::pair<std::string, std::size_t>> tags = {
-        {"0?SP_Baud?unsignedInt", 4},  {"0?SP_Par?unsignedByte", 1},
-        {"0?SP_Bits?unsignedByte", 1}, {"0?SP_Stop?unsignedByte", 1},
-        {"0?SP_Mode?unsignedByte", 1}, {"0?SP_RxPrefix?string-3", 3},
-        {"0?SP_TxSuffix?string-3", 3}, {"0?SP_Gap?unsignedInt", 4},
-        {"0?SP_HexTokens?boolean", 1}, {"0?SP_TokenQueueSize?unsignedInt", 4},
-        {"0?SP_Done?boolean", 1},      {"0?connect?boolean", 1},
-        {"0?token_ack?boolean", 1},    {"0?tx_token?string-2", 2},
-        {"0?tokens_available?unsignedInt", 4}, {"0?rx_token?string-3", 3},
+        {"0?SP_Baud?unsignedInt", 4},
+        {"0?SP_Par?unsignedByte", 1},
+        {"0?SP_Bits?unsignedByte", 1},
+        {"0?SP_Stop?unsignedByte", 1},
+        {"0?SP_Mode?unsignedByte", 1},
+        {"0?SP_RxPrefix?string-3", 3},
+        {"0?SP_TxSuffix?string-3", 3},
+        {"0?SP_Gap?unsignedInt", 4},
+        {"0?SP_HexTokens?boolean", 1},
+        {"0?SP_TokenQueueSize?unsignedInt", 4},
+        {"0?SP_Done?boolean", 1},
+        {"0?connect?boolean", 1},
+        {"0?token_ack?boolean", 1},
+        {"0?tx_token?string-2", 2},
+        {"0?tokens_available?unsignedInt", 4},
+        {"0?rx_token?string-3", 3},
         {"0?rx_token_len?unsignedInt", 4}};
     // An empty queue; rx_token_len then writes only its first byte.
-    EXPECT_EQ(readHex(tags), "80250000 02 07 02 02 304400 303300 19000000 00 07000000 00 01 00 "
-                             "0000 00000000 000000 00000000");
+    EXPECT_EQ(readHex(tags),
+              "80250000 02 07 02 02 304400 303300 19000000 00 07000000 00 01 00 "
+              "0000 00000000 000000 00000000");
     play("0D 41 42 0A 0D 43 0A");
-    EXPECT_EQ(readHex({{"0?tokens_available?unsignedInt", 4}, {"0?rx_token?string-3", 3},
-                       {"0?rx_token?string-3", 3}, {"0?rx_token_len?unsignedInt", 4}}),
+    EXPECT_EQ(readHex({{"0?tokens_available?unsignedInt", 4},
+                       {"0?rx_token?string-3", 3},
+                       {"0?rx_token?string-3", 3},
+                       {"0?rx_token_len?unsignedInt", 4}}),
               "02000000 414200 414200 02000000");  // reading does not consume
     EXPECT_TRUE(writeBool("token_ack", true));
     EXPECT_EQ(readText("rx_token"), "C");
@@ -90,6 +101,8 @@ TEST_F(MemoryTypes, RefusedAccesses) {
         EXPECT_FALSE(write(uri, "\1\0\0\0\0\0\0\0")) << uri;
         expectError("writing to read_only type");
     }
+    EXPECT_FALSE(protocol->ReadTagRaw(tag("0?rx_token_len?unsignedInt"), nullptr, 4));
+    expectError("illegal memtype to read");
     EXPECT_FALSE(writeText("SP_RxPrefix", "02", 10000));
     expectError("writing after the end of memory type");
     EXPECT_TRUE(writeText("SP_RxPrefix", "02", 9999));

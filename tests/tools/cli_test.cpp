@@ -50,7 +50,8 @@ TEST(Cli, DemoShowsTokensWithinSecondsAndStopsAtTheCount) {
 
 TEST(Cli, CtrlCEndsTheDemoCleanly) {
     Subprocess demo({kHost, "demo", "--interval", "50", "--plugin", kPlugin});
-    ASSERT_TRUE(demo.waitForOutput("received  \"", 5s));
+    // Without a count it goes on: a second code comes before Ctrl-C.
+    ASSERT_TRUE(demo.waitForOutput("received  \"", 5s, 2));
     demo.interrupt();
     Finished done = demo.finish(10s);
     EXPECT_EQ(done.status, 0) << done.err;
@@ -231,6 +232,10 @@ const BadInput kBadInputs[] = {
     {"unknown option", {"demo", "--colour"}, "--colour", 2},
     {"no configuration option", {"run"}, "--config is required", 2},
     {"count of zero", {"demo", "--count", "0"}, "whole number above 0", 2},
+    {"watch count of zero",
+     {"run", "--config", kNoPort + " port={line}", "--exec", "watch --count 0"},
+     "--count",
+     1},
     {"bad port map", {"run", "--config", kNoPort, "--map", "com99=/dev/x"}, "comN=DEVICE", 2},
     {"configuration file missing", {"run", "--config", "@{dir}/none.cfg"}, "cannot read", 2},
 };

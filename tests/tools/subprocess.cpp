@@ -70,9 +70,19 @@ std::string Subprocess::file(const char* name) const {
 }
 
 // The output is a file, with nothing to wait on: it is looked at every millisecond.
-bool Subprocess::waitForOutput(const std::string& text, std::chrono::milliseconds patience) {
+bool Subprocess::waitForOutput(const std::string& text, std::chrono::milliseconds patience,
+                               int times) {
     const auto deadline = Clock::now() + patience;
-    while (contentOf(file("out")).find(text) == std::string::npos) {
+    auto seen = [&] {
+        const std::string out = contentOf(file("out"));
+        int count = 0;
+        for (std::size_t at = out.find(text); at != std::string::npos;
+             at = out.find(text, at + 1)) {
+            ++count;
+        }
+        return count >= times;
+    };
+    while (!seen()) {
         if (Clock::now() > deadline) {
             return false;
         }

@@ -29,8 +29,8 @@ public:
     Subprocess(const Subprocess&) = delete;
     Subprocess& operator=(const Subprocess&) = delete;
 
-    /// Waits until standard output holds `text`; false at the deadline.
-    bool waitForOutput(const std::string& text, std::chrono::milliseconds patience);
+    /// Waits until standard output holds `text` `times` times; false at the deadline.
+    bool waitForOutput(const std::string& text, std::chrono::milliseconds patience, int times = 1);
     /// Ctrl-C, as a person at the terminal would press it.
     void interrupt();
     /// Waits for the child to end, killing it at the deadline.

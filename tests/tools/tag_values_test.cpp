@@ -47,6 +47,7 @@ const Parsed kParsed[] = {
     {"boolean two", kBoolean, "2", {}, "no boolean"},
     {"float", kFloat, "1.5", {0x00, 0x00, 0xC0, 0x3F}, ""},
     {"float too big", kFloat, "1e39", {}, "out of range"},
+    {"largest float", kFloat, "3.4028234663852886e38", {0xFF, 0xFF, 0x7F, 0x7F}, ""},
     {"double holds it", kDouble, "1e39", {0x1D, 0x4A, 0x9C, 0xF4, 0x87, 0x82, 0x07, 0x48}, ""},
     {"string", kString8, "HELLO", {'H', 'E', 'L', 'L', 'O', 0, 0, 0}, ""},
     {"string escapes", kString8, "A\\x02\\\\", {'A', 0x02, '\\', 0, 0, 0, 0, 0}, ""},
@@ -106,6 +107,7 @@ const Shown kShown[] = {
     {"short array", kShorts2, {1, 0, 0xFF, 0xFF}, "1 -1", "[1,-1]"},
     {"binary", kBinary4, {0xDE, 0xAD, 0xBE, 0xEF}, "DE AD BE EF", "\"DE AD BE EF\""},
     {"float", kFloat, {0x00, 0x00, 0xC0, 0x3F}, "1.5", "1.5"},
+    {"double", kDouble, {0, 0, 0, 0, 0, 0, 0xF8, 0x3F}, "1.5", "1.5"},
     {"infinity is no JSON number", kFloat, {0x00, 0x00, 0x80, 0x7F}, "inf", "\"inf\""},
 };
 
