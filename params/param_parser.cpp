@@ -1,5 +1,7 @@
 #include "params/param_parser.h"
 
+#include "xtokline/text.h"
+
 #include <algorithm>
 #include <cerrno>
 #include <cstdlib>
@@ -21,16 +23,6 @@ bool isWhite(char c) {
 
 bool isDigit(char c) {
     return c >= '0' && c <= '9';
-}
-
-int32_t clampToInt32(long value) {
-    if (value > std::numeric_limits<int32_t>::max()) {
-        return std::numeric_limits<int32_t>::max();
-    }
-    if (value < std::numeric_limits<int32_t>::min()) {
-        return std::numeric_limits<int32_t>::min();
-    }
-    return static_cast<int32_t>(value);
 }
 
 // Decimal digits only; a run too long for a node number saturates instead of
@@ -172,10 +164,7 @@ bool toString(const std::string& value, std::string& out) {
 // A number out of range saturates rather than wrapping into a plausible
 // value; errno is left as the caller had it.
 bool toInt(const std::string& value, int32_t& out) {
-    int savedErrno = errno;
-    long number = std::strtol(value.c_str(), nullptr, 0);
-    errno = savedErrno;
-    out = clampToInt32(number);
+    parseClamped(value, 0, out);
     return true;
 }
 

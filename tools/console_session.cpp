@@ -100,9 +100,11 @@ std::string codeName(const std::string& tag, unsigned code) {
 }
 
 bool parseCount(const std::string& text, long& number) {
-    char* end = nullptr;
-    number = std::strtol(text.c_str(), &end, 10);
-    return !text.empty() && *end == '\0' && number > 0;
+    int32_t whole = 0;
+    std::size_t used = 0;
+    const bool ok = parseClamped(text, 10, whole, &used) && used == text.size() && whole > 0;
+    number = whole;
+    return ok;
 }
 
 bool parseSeconds(const std::string& text, double& seconds) {

@@ -11,6 +11,7 @@
 #include "tools/plugin_path.h"
 #include "tools/ports.h"
 #include "tools/run_command.h"
+#include "xtokline/text.h"
 
 namespace {
 
@@ -28,11 +29,11 @@ int usageError(const CLI::ParseError& e) {
 
 /// A whole number above 0, said in one short line when it is not.
 std::string positive(std::string& value) {
-    char* end = nullptr;
-    long number = std::strtol(value.c_str(), &end, 10);
-    return value.empty() || *end != '\0' || number <= 0
-               ? "must be a whole number above 0, not '" + value + "'"
-               : "";
+    int32_t number = 0;
+    std::size_t used = 0;
+    return xtok::parseClamped(value, 10, number, &used) && used == value.size() && number > 0
+               ? ""
+               : "must be a whole number above 0, not '" + value + "'";
 }
 
 /// CLI11 takes an unknown first word for a stray argument and asks for a
