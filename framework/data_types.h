@@ -2,6 +2,7 @@
 // e.g. "unsignedShort", "byte-16" or "short-4(swap2,neg)".
 #pragma once
 
+#include <climits>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -10,11 +11,11 @@
 
 namespace xtok {
 
-/// The largest datum a data type text may describe, in bytes (in bits for
-/// the bit types). Far beyond any token or panel variable, and small enough
-/// that size arithmetic never overflows 32 bits; a longer text is refused as
-/// an unknown type rather than allocating without bound.
-constexpr int32_t kMaxDataSize = 1000000;
+/// The largest datum a data type text may describe, in bytes: its size in
+/// bits, as the bit types count it, still fits 32 bits. A longer text is
+/// refused as an unknown type; a tag this large may still fail to get its
+/// buffer when it is read, which fails the read with "not enough memory".
+constexpr int32_t kMaxDataSize = INT32_MAX / 8;
 
 /// A parsed data type text.
 struct DataType {

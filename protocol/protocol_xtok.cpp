@@ -32,9 +32,8 @@ Protocol_XTOK::~Protocol_XTOK() {
     if (task_.HasTask()) {
         task_.StopTask(1000);
     }
-    const int32_t gap = active_[kGap].load();
-    const int32_t readTimeout = gap > 0 ? gap : 500;
-    task_.Retire(readTimeout < INT32_MAX - 10000 ? readTimeout + 10000 : INT32_MAX);
+    // A pass ends within one slice of its read (500 ms) once the port is given up.
+    task_.Retire(10500);
     if (IMultiTask2* tasks = services_.multiTask) {
         tasks->DestroyMutex(queueLock_);
         tasks->DestroyMutex(portLock_);

@@ -80,8 +80,11 @@ private:
     enum class ReadResult { Byte, Timeout, Disconnected };
     void pushToken(const char* bytes, std::size_t length);
     ReadResult readByte(uint8_t* byte, int32_t timeoutMs);
-    /// A pass that reads only while connected.
-    void receiveFramed(const std::string& prefix, const std::string& suffix, int32_t timeout);
+    /// A byte within `timeoutMs`, read in bounded slices; Disconnected also
+    /// when the task is asked to stop between two slices.
+    ReadResult readWithin(uint8_t* byte, int32_t timeoutMs);
+    /// A pass that reads only while connected; true when it read any byte.
+    bool receiveFramed(const std::string& prefix, const std::string& suffix, int32_t timeout);
 
     // Settings, with queueLock held.
     StoredValue activeValue(SettingId id) const;

@@ -4,6 +4,7 @@
 #include <cstring>
 #include <string>
 
+#include "framework/clock.h"
 #include "protocol/host_lock.h"
 #include "protocol/protocol_xtok.h"
 #include "xtokline/text.h"
@@ -14,8 +15,11 @@ namespace {
 
 // A frame (prefix and suffix included) past this many bytes is dropped.
 constexpr std::size_t kMaxFrame = 1000;
-// A gap of 0 stands for this many milliseconds of silence.
+// A gap of 0 or less stands for this many milliseconds of silence.
 constexpr int32_t kDefaultGap = 500;
+// The longest single read: a longer gap is waited out in slices of this, so
+// that a close or a stop never waits on one long read.
+constexpr int32_t kSliceMs = 500;
 constexpr int32_t kIdleSleepMs = 10;
 
 // Whether the `length` bytes at `frame` end with `tail`. The caller has
@@ -60,10 +64,32 @@ void Protocol_XTOK::receiveToken() {
         appendHexBytes(activeText_[kRxSuffix], rxSuffix_);
     }
     const int32_t gap = active_[kGap].load(std::memory_order_relaxed);
-    receiveFramed(rxPrefix_, rxSuffix_, gap == 0 ? kDefaultGap : gap);
+    const int32_t timeout = gap <= 0 ? kDefaultGap : gap;
+    const int64_t began = NowStamp();
+    // A pass that read nothing and ended long before its gap met a line that
+    // fails at once (hung up): a pause keeps the task from spinning on it.
+    if (!receiveFramed(rxPrefix_, rxSuffix_, timeout) && NowStamp() - began < timeout / 2) {
+        if (IMultiTask2* tasks = services_.multiTask) {
+            tasks->Sleep(kIdleSleepMs);
+        }
+    }
 }
 
-void Protocol_XTOK::receiveFramed(const std::string& prefix, const std::string& suffix,
+Protocol_XTOK::ReadResult Protocol_XTOK::readWithin(uint8_t* byte, int32_t timeoutMs) {
+    for (int32_t left = timeoutMs;;) {
+        const int32_t slice = std::min(left, kSliceMs);
+        const ReadResult read = readByte(byte, slice);
+        left -= slice;
+        if (read != ReadResult::Timeout || left <= 0) {
+            return read;
+        }
+        if (task_.IsStopRequested()) {
+            return ReadResult::Disconnected;
+        }
+    }
+}
+
+bool Protocol_XTOK::receiveFramed(const std::string& prefix, const std::string& suffix,
                                   int32_t timeout) {
     // The frame is collected in frame_'s storage, sized once for the longest
     // frame a pass can hold (the size test below runs after each byte), and
@@ -91,6 +117,7 @@ void Protocol_XTOK::receiveFramed(const std::string& prefix, const std::string& 
     // the prefix length or more, where the test is true whatever the
     // frame's length.
     std::size_t length = 0;
+    bool received = false;  // any byte in this pass
 
     // Hunt for the prefix. A prefix byte is compared as a signed value
     // with the received byte as an unsigned one, so a byte of 0x80 or
@@ -99,9 +126,10 @@ void Protocol_XTOK::receiveFramed(const std::string& prefix, const std::string& 
     // alone, never at a shorter partial match. Both are how devices in
     // the field expect it.
     while (length < prefix.size()) {
-        if (readByte(at + length, timeout) != ReadResult::Byte) {
-            return;  // a partial prefix is dropped
+        if (readWithin(at + length, timeout) != ReadResult::Byte) {
+            return received;  // a partial prefix is dropped
         }
+        received = true;
         const uint8_t byte = at[length];
         if (static_cast<int>(static_cast<int8_t>(prefix[length])) == static_cast<int>(byte)) {
             ++length;
@@ -115,19 +143,19 @@ void Protocol_XTOK::receiveFramed(const std::string& prefix, const std::string& 
     }
 
     for (;;) {
-        ReadResult read = readByte(at + length, timeout);
+        ReadResult read = readWithin(at + length, timeout);
         if (read != ReadResult::Byte) {
             // The gap ends a token only where no suffix is expected.
             if (read == ReadResult::Timeout && suffix.empty() && length > prefix.size()) {
                 pushToken(frame + prefix.size(), length - prefix.size());
             }
-            return;
+            return received || length > 0;
         }
         if (frame[length++] == last && framed && length >= ends) {
             if (!suffix.empty()) {
                 if (endsWith(frame, length, suffix)) {
                     pushToken(frame + prefix.size(), length - prefix.size() - suffix.size());
-                    return;
+                    return true;
                 }
             } else if (endsWith(frame, length, prefix)) {
                 // The next token's prefix: deliver what lies between.
@@ -143,7 +171,7 @@ void Protocol_XTOK::receiveFramed(const std::string& prefix, const std::string& 
             }
         }
         if (length > kMaxFrame) {
-            return;
+            return true;
         }
     }
 }

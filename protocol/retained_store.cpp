@@ -4,8 +4,10 @@ namespace xtok {
 
 namespace {
 
-// A retained text longer than this is not read back.
-constexpr int32_t kTextBufferSize = 256;
+// A retained text is read into a buffer that doubles until the text fits,
+// up to this size; a longer one (no setting has one) reads as empty.
+constexpr int32_t kFirstTextBuffer = 256;
+constexpr int32_t kLastTextBuffer = 1 << 20;
 
 std::string readStoredText(IPermanentStorage* storage, const std::string& section,
                            const std::string& key) {
@@ -14,12 +16,14 @@ std::string readStoredText(IPermanentStorage* storage, const std::string& sectio
         const char* text = storage->ReadText(section.c_str(), key.c_str());
         return text ? text : "";
     }
-    char buffer[kTextBufferSize] = {};
-    if (!extended->ReadTextTo(section.c_str(), key.c_str(), buffer, kTextBufferSize)) {
-        return "";
+    for (int32_t size = kFirstTextBuffer; size <= kLastTextBuffer; size *= 2) {
+        std::string buffer(static_cast<std::size_t>(size), '\0');
+        if (extended->ReadTextTo(section.c_str(), key.c_str(), &buffer[0], size)) {
+            buffer.back() = '\0';
+            return buffer.c_str();
+        }
     }
-    buffer[kTextBufferSize - 1] = '\0';
-    return buffer;
+    return "";
 }
 
 }  // namespace

@@ -235,9 +235,12 @@ TEST_F(MemoryTypes, RetainedValuesWinOverTheConfigurationAtStart) {
         host.storage().put("XTOK", key, value);
     }
     host.storage().put("Other", "baud", "38400");
+    const std::string longSuffix(600, 'A');  // any length comes back
+    host.storage().put("XTOK", "tx_suffix", longSuffix);
     ASSERT_TRUE(start("rx_prefix=AA rx_suffix=BB"));
     EXPECT_EQ(settingsText(), "com1,19200,space,8,1,RS-485P");
     EXPECT_EQ(readText("SP_RxPrefix"), "02");
+    EXPECT_EQ(readText("SP_TxSuffix", 700), longSuffix);
     play("AA 41 BB 02 41 42 03");
     EXPECT_EQ(takeTokens(), Tokens{"4142"});
     host.storage().put("XTOK", "baud", "57600");  // read once, at the first Start

@@ -177,6 +177,8 @@ TEST_F(Protocol, TagsAreMadeOrRefusedWithTheirReason) {
         {"010?connect?boolean", nullptr, 8},
         {"4?connect?boolean", nullptr, 4},
         {"42?tx_token?string-8", nullptr, 42},
+        {"0?tx_token?string-1000001", nullptr, 0},
+        {"0?tx_token?string-268435456", "string-268435456: data type unknown", 0},
         {"0?SP_Baud?unsignedInt", nullptr, 0},
     };
     ASSERT_TRUE(configure("Node3::model=7 Node4::model=1"));

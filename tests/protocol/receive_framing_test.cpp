@@ -121,6 +121,22 @@ TEST_F(Receive, NothingIsReadWhileDisconnected) {
     EXPECT_EQ(takeTokens(), std::vector<std::string>{"AB"});
 }
 
+// A hung-up line fails every read at once: the task pauses between passes
+// instead of spinning, and a new open resumes reception.
+TEST_F(Receive, AHungUpLineIsNotSpunOn) {
+    ASSERT_TRUE(start("rx_suffix=03"));
+    host.serial().hangUp();
+    ASSERT_TRUE(eventually([&] { return host.serial().record().hungUp; }));
+    const long reads = host.serial().record().reads, idle = host.tasks().idleSleeps();
+    ASSERT_TRUE(eventually([&] { return host.tasks().idleSleeps() >= idle + 5; }));
+    EXPECT_LE(host.serial().record().reads - reads, 2 * (host.tasks().idleSleeps() - idle) + 2);
+    EXPECT_EQ(command("get_stat"), "Connected");
+    EXPECT_EQ(command("connect OFF"), "OK");
+    EXPECT_EQ(command("connect ON"), "OK");
+    play("41 03");
+    EXPECT_EQ(takeTokens(), std::vector<std::string>{"A"});
+}
+
 /// A line that delivers "AB", then holds the next read until release(): with
 /// a byte, or as a time-out. A test can so act while the receive task waits
 /// inside a read, holding the port's lock.

@@ -100,6 +100,18 @@ TEST_F(Session, ScriptedRunReadsWritesAndWatches) {
     EXPECT_EQ(device_->tokens(), std::vector<std::string>{"HELLO"});
 }
 
+// However long the gap, a close and the end of the run come within about
+// half a second: the wait for silence is read in slices.
+TEST_F(Session, ALongGapDelaysNoClose) {
+    const auto began = std::chrono::steady_clock::now();
+    Finished done = runTool(run({"--exec",
+                                 "tag write 0?SP_Gap?unsignedInt 30000; "
+                                 "tag write 0?SP_Done?boolean 1; connect OFF; get_stat"}));
+    EXPECT_EQ(done.status, 0) << done.err;
+    EXPECT_EQ(linesOf(done.out).back(), "Disconnected");
+    EXPECT_LT(std::chrono::steady_clock::now() - began, 5s);
+}
+
 // SP_Done keeps the settings in the state file: the next run starts with them.
 TEST_F(Session, RetainedSettingsSurviveARestart) {
     Finished done = runTool(run({"--exec",
