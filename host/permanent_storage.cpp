@@ -20,10 +20,9 @@ constexpr const char* kSchema =
     " \"int\" INTEGER, \"text\" TEXT,"
     " PRIMARY KEY (section, key))";
 
-// A rollback journal with full syncs: each write is its own transaction and
-// is on disk when it returns, a kill at any point leaves the old or the new
-// value, and between writes the state is the one file.
-constexpr const char* kPragmas = "PRAGMA journal_mode=DELETE; PRAGMA synchronous=FULL";
+// A write-ahead log with full syncs: a transaction is on disk when it
+// commits, and a kill at any point leaves the state of the last commit.
+constexpr const char* kPragmas = "PRAGMA journal_mode=WAL; PRAGMA synchronous=FULL";
 
 constexpr const char* kUpsert =
     "INSERT OR REPLACE INTO retained (section, key, kind, \"int\", \"text\")"
@@ -129,9 +128,34 @@ bool PermanentStorage::write(const char* section, const char* key, const char* k
                  (text ? sqlite3_bind_text(upsert_, 5, text, -1, SQLITE_TRANSIENT)
                        : sqlite3_bind_int64(upsert_, 4, number)) == SQLITE_OK;
     bool done = bound && sqlite3_step(upsert_) == SQLITE_DONE;
+    if (!done && failure_.empty()) {
+        failure_ = sqlite3_errmsg(db_);
+    }
     sqlite3_reset(upsert_);
     sqlite3_clear_bindings(upsert_);
     return done;
+}
+
+bool PermanentStorage::begin(std::string& error) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    failure_.clear();
+    if (sqlite3_exec(db_, "BEGIN IMMEDIATE", nullptr, nullptr, nullptr) != SQLITE_OK) {
+        error = sqlite3_errmsg(db_);
+        return false;
+    }
+    return true;
+}
+
+bool PermanentStorage::commit(std::string& error) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    const bool keep = failure_.empty();
+    if (sqlite3_exec(db_, keep ? "COMMIT" : "ROLLBACK", nullptr, nullptr, nullptr) == SQLITE_OK &&
+        keep) {
+        return true;
+    }
+    error = keep ? sqlite3_errmsg(db_) : failure_;
+    sqlite3_exec(db_, "ROLLBACK", nullptr, nullptr, nullptr);  // a failed COMMIT leaves it open
+    return false;
 }
 
 bool PermanentStorage::read(const char* section, const char* key, int64_t* number,

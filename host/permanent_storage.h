@@ -36,6 +36,14 @@ public:
     int32_t Reserved13() override { return 0; }
     bool ReadTextTo(const char* section, const char* key, char* buffer, int32_t size) override;
 
+    /// Makes the writes until commit() one transaction, so that a crash
+    /// keeps all of them or none. False with the reason (the file locked past
+    /// the busy wait, ...).
+    bool begin(std::string& error);
+    /// Keeps the transaction's writes; when one of them failed, or keeping
+    /// them does, none is kept: false with the first reason.
+    bool commit(std::string& error);
+
 private:
     explicit PermanentStorage(sqlite3* db);
     /// Settings, table and statements; false with the reason in sqlite3_errmsg.
@@ -50,6 +58,7 @@ private:
     sqlite3* db_;
     sqlite3_stmt* upsert_ = nullptr;
     sqlite3_stmt* select_ = nullptr;
+    std::string failure_;  ///< the first failed write of the transaction
 };
 
 }  // namespace xtok::host

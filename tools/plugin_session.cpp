@@ -1,5 +1,7 @@
 #include "tools/plugin_session.h"
 
+#include "host/permanent_storage.h"
+
 #include <cctype>
 #include <mutex>
 
@@ -217,6 +219,18 @@ bool PluginSession::read(const std::string& address, TagValue& value, std::strin
     return readBytes(*found, value.bytes, error);
 }
 
+template <class Call>
+std::string PluginSession::retaining(Call call) {
+    host::PermanentStorage* storage = host_->permanentStorage();
+    std::string why;
+    if (storage && !storage->begin(why)) {
+        call();
+        return "settings cannot be retained: " + why;
+    }
+    call();
+    return !storage || storage->commit(why) ? "" : "settings are not retained: " + why;
+}
+
 bool PluginSession::write(const std::string& address, const std::string& text, std::string& error) {
     ITag* found = tag(address, error);
     std::vector<uint8_t> bytes;
@@ -225,17 +239,27 @@ bool PluginSession::write(const std::string& address, const std::string& text, s
     }
     uint8_t none = 0;
     ErrorRecord before = errorRecord();
-    if (!protocol_->WriteTag(found, bytes.empty() ? &none : bytes.data())) {
+    bool written = false;
+    const std::string kept = retaining(
+        [&] { written = protocol_->WriteTag(found, bytes.empty() ? &none : bytes.data()); });
+    if (!written) {
         error = "cannot write " + address + ": " + reasonSince(before);
-        return false;
+    } else if (!kept.empty()) {
+        error = address + " written, but its " + kept;
     }
-    return true;
+    return written && kept.empty();
 }
 
 std::string PluginSession::command(const std::string& line, bool& ok) {
     std::vector<char> buffer(kReplySize, '\0');
-    bool known = protocol_->DoCommand(line.c_str(), buffer.data(), kReplySize - 1);
+    bool known = false;
+    const std::string kept = retaining(
+        [&] { known = protocol_->DoCommand(line.c_str(), buffer.data(), kReplySize - 1); });
     std::string reply(buffer.data());
+    if (!kept.empty()) {
+        ok = false;
+        return reply.empty() ? kept : reply + " (but " + kept + ")";
+    }
     std::string word = line.substr(0, line.find(' '));
     if (!known && reply.empty()) {
         ok = false;

@@ -81,6 +81,11 @@ private:
     ErrorRecord errorRecord();
     /// Why the call that followed `before` failed.
     std::string reasonSince(const ErrorRecord& before);
+    /// Runs `call` into the plug-in as one storage transaction: the settings
+    /// it retains are kept all together or not at all. "" when they are kept
+    /// (or nothing is stored), else why they are not.
+    template <class Call>
+    std::string retaining(Call call);
 
     struct TagDeleter {
         void operator()(ITag* tag) const;

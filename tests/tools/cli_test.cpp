@@ -8,7 +8,9 @@
 
 #include <fstream>
 #include <map>
+#include <thread>
 
+#include "host/permanent_storage.h"
 #include "tests/host/temp_dir.h"
 #include "tests/tools/subprocess.h"
 #include "tools/pty_pair.h"
@@ -110,6 +112,33 @@ TEST_F(Session, ALongGapDelaysNoClose) {
     EXPECT_EQ(done.status, 0) << done.err;
     EXPECT_EQ(linesOf(done.out).back(), "Disconnected");
     EXPECT_LT(std::chrono::steady_clock::now() - began, 5s);
+}
+
+// SP_Done retains its settings in one transaction: a run killed at any
+// moment leaves the whole old set or the whole new set in the state file.
+TEST_F(Session, AKillDuringSpDoneLeavesTheOldSetOrTheNew) {
+    for (int round = 1; round <= 16; ++round) {
+        std::string script;
+        for (int i = 10; i < 60; ++i) {  // every SP_Done changes every value
+            const std::string n = std::to_string(i);
+            script += "tag write 0?SP_Gap?unsignedInt " + n +
+                      "; tag write 0?SP_TokenQueueSize?unsignedInt " + n +
+                      "; tag write 0?SP_TxPrefix?string-8 " + n +
+                      "; tag write 0?SP_Done?boolean 1; ";
+        }
+        Subprocess session(run({"--exec", script}));
+        // Killed once it runs, a little later each round.
+        session.waitForOutput("ok\n", 10s);
+        std::this_thread::sleep_for(std::chrono::microseconds(1300 * round));
+        kill(session.pid(), SIGKILL);
+        session.finish(10s);
+        std::string error;
+        auto storage = host::PermanentStorage::open(dir_.file("retained.sqlite3"), error);
+        ASSERT_NE(storage, nullptr) << error;
+        const int32_t gap = storage->ReadInt("XTOK", "gap");
+        EXPECT_EQ(storage->ReadInt("XTOK", "token_queue_size"), gap) << round;
+        EXPECT_EQ(storage->ReadText("XTOK", "tx_prefix"), gap ? std::to_string(gap) : "") << round;
+    }
 }
 
 // SP_Done keeps the settings in the state file: the next run starts with them.

@@ -31,6 +31,7 @@ public:
 
     /// Waits until standard output holds `text` `times` times; false at the deadline.
     bool waitForOutput(const std::string& text, std::chrono::milliseconds patience, int times = 1);
+    pid_t pid() const { return pid_; }
     /// Ctrl-C, as a person at the terminal would press it.
     void interrupt();
     /// Waits for the child to end, killing it at the deadline.
