@@ -76,6 +76,9 @@ void Protocol_XTOK::receiveToken() {
 }
 
 Protocol_XTOK::ReadResult Protocol_XTOK::readWithin(uint8_t* byte, int32_t timeoutMs) {
+    if (timeoutMs <= kSliceMs) {
+        return readByte(byte, timeoutMs);  // every byte of a token: kept short
+    }
     for (int32_t left = timeoutMs;;) {
         const int32_t slice = std::min(left, kSliceMs);
         const ReadResult read = readByte(byte, slice);
