@@ -7,232 +7,80 @@
 namespace xtok::test {
 namespace {
 
-class Faults : public ProtocolFixture {
-public:
-    /// Starts with STX/ETX framing and two tokens queued, "AB" and "CD".
-    void startWithTwoTokens(const std::string& keys = "") {
-        ASSERT_TRUE(start("rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03 " + keys));
-        host.serial().feed(
-            "\x02"
-            "AB\x03\x02"
-            "CD\x03");
-        ASSERT_TRUE(host.serial().waitDrained());
-    }
-    /// `ok` and the last error, if it failed.
-    std::string said(bool ok) { return ok ? "ok" : "failed: " + error(); }
-    /// The state a panel sees: connection, port, and the tokens it takes.
-    std::string state() {
-        std::string tokens;
-        for (const std::string& t : takeTokens()) {
-            tokens += " " + t;
-        }
-        return command("get_stat") + (host.serial().isOpen() ? " open," : " closed,") + tokens;
-    }
-    /// Plays one more token and says what the queue then holds.
-    std::string receives() {
-        play("02 45 46 03");
-        return state();
-    }
-};
-
-struct FaultCase {
-    const char* name;
-    std::function<std::string(Faults&)> run;
-    const char* outcome;
-};
-
-// Each row's steps append to `o` in order (the operands of one expression
-// would run in any order).
-const FaultCase kFaults[] = {
-    {"PortRefusedAtStart",
-     [](Faults& f) {
-         f.host.serial().refuseOpen = true;
-         std::string o = f.said(f.start());
-         return o += " | " + f.said(f.writeText("tx_token", "x"));
-     },
-     "failed: Can't open serial port | failed: Protocol not started"},
+// Most rows start with STX/ETX framing and the tokens "AB" and "CD" queued.
+const Scenario kFaults[] = {
+    {"PortRefusedAtStart", "fault open; start; w tx_token x",
+     "!Can't open serial port | !Protocol not started"},
     {"SettingsRefusedAtStartNoTaskUntilAStartSucceeds",
-     [](Faults& f) {
-         f.host.serial().failConfigure = true;
-         std::string o = f.said(f.start());
-         o += " " + std::to_string(f.host.tasks().lastTask() != nullptr);
-         f.host.serial().failConfigure = false;
-         return o += " | " + f.said(f.protocol->Start());
-     },
-     "failed: Can't open serial port 0 | ok"},
+     "fault configure; start; tasks; heal configure; go; tasks",
+     "!Can't open serial port | - | CreateTask 3 0"},
     {"PortRefusedByTheConnectTag",
-     [](Faults& f) {
-         f.startWithTwoTokens();
-         f.writeBool("connect", false);
-         f.host.serial().refuseOpen = true;
-         std::string o = f.said(f.writeBool("connect", true));
-         o += " | " + f.said(f.writeText("tx_token", "x"));
-         return o += " | " + f.state();
-     },
-     "failed: Can't open serial port | failed: Serial port not active for sending | "
-     "Disconnected closed, AB CD"},
+     "start rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03; play 02 41 42 03 02 43 44 03; "
+     "w connect 0; fault open; w connect 1; w tx_token x; cmd get_stat; opens; tokens",
+     "!Can't open serial port | !Serial port not active for sending | Disconnected | 1/1 com1 | "
+     "AB,CD"},
     {"SettingsRefusedByTheConsoleConnect",
-     [](Faults& f) {
-         f.startWithTwoTokens();
-         f.command("connect OFF");
-         f.host.serial().failConfigure = true;
-         std::string o = f.command("connect ON");
-         o += " | " + f.command("put 41");
-         return o += " | " + f.state();
-     },
-     "Can't open serial port | ERROR: serial port is not active for sending | "
-     "Disconnected closed, AB CD"},
+     "start rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03; play 02 41 42 03 02 43 44 03; "
+     "cmd connect OFF; fault configure; cmd connect ON; cmd put 41; cmd get_stat; tokens",
+     "OK | Can't open serial port | !ERROR: serial port is not active for sending | Disconnected | "
+     "AB,CD"},
     {"ReconfigureRefusedBySpDone",
-     [](Faults& f) {
-         f.startWithTwoTokens();
-         f.host.serial().failConfigure = true;
-         f.writeInt("SP_Baud", 19200);
-         std::string o = f.said(f.writeBool("SP_Done", true));
-         o += " " + f.host.storage().get("XTOK", "baud");
-         return o += " | " + f.receives();
-     },
-     "ok 19200 | Connected open, EF"},
+     "start rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03; play 02 41 42 03 02 43 44 03; "
+     "fault configure; w SP_Baud 19200; w SP_Done 1; stored baud; play 02 45 46 03; "
+     "cmd get_stat; tokens",
+     "19200 | Connected | EF"},
     {"ReadErrorInATokenEndsItLikeASilence",
-     [](Faults& f) {
-         f.startWithTwoTokens();
-         f.host.serial().feed(
-             "\x02"
-             "GH");
-         f.host.serial().readError();
-         return f.receives();
-     },
-     "Connected open, AB CD EF"},
+     "start rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03; play 02 41 42 03 02 43 44 03; "
+     "feed 02 47 48; error; play 02 45 46 03; tokens",
+     "AB,CD,EF"},
     {"HangUpKeepsTheQueueAndReconnectResumes",
-     [](Faults& f) {
-         f.startWithTwoTokens();
-         f.host.serial().feed(
-             "\x02"
-             "GH");
-         f.host.serial().hangUp();
-         f.host.serial().waitDrained();
-         std::string o = f.state();
-         f.writeBool("connect", false);
-         f.writeBool("connect", true);
-         return o += " | " + f.receives();
-     },
-     "Connected open, AB CD | Connected open, EF"},
+     "start rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03; play 02 41 42 03 02 43 44 03; "
+     "feed 02 47 48; hangup; drain; cmd get_stat; tokens; w connect 0; w connect 1; "
+     "play 02 45 46 03; tokens; opens",
+     "Connected | AB,CD | EF | 2/1 com1"},
     {"HangUpThenStopAndStartResume",
-     [](Faults& f) {
-         f.startWithTwoTokens();
-         f.host.serial().hangUp();
-         f.host.serial().waitDrained();
-         std::string o = f.said(f.protocol->Stop() && f.protocol->Start());
-         return o += " | " + f.receives();
-     },
-     "ok | Connected open, AB CD EF"},
+     "start rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03; play 02 41 42 03 02 43 44 03; "
+     "hangup; drain; stop; go; play 02 45 46 03; tokens",
+     "AB,CD,EF"},
     {"FailedWritesAreNotReported",
-     [](Faults& f) {
-         f.startWithTwoTokens();
-         f.host.serial().failWrite = true;
-         std::string o = f.said(f.writeText("tx_token", "hi"));
-         o += " " + f.command("put again");
-         o += " " + std::to_string(f.host.serial().writes().size());
-         return o += " | " + f.receives();
-     },
-     "ok OK 2 | Connected open, AB CD EF"},
+     "start rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03; play 02 41 42 03 02 43 44 03; "
+     "fault write; w tx_token hi; cmd put again; sent; play 02 45 46 03; tokens",
+     "OK | 02686903,02616761696E03 | AB,CD,EF"},
     {"StorageWritesFailButTheSettingsHoldWhileTheProtocolLives",
-     [](Faults& f) {
-         f.startWithTwoTokens();
-         f.host.storage().failWrites = true;
-         f.writeInt("SP_Gap", 25);
-         f.writeText("SP_TxPrefix", "0D");
-         std::string o = f.said(f.writeBool("SP_Done", true));
-         f.writeText("tx_token", "x");
-         f.protocol->Stop();
-         f.protocol->Start();
-         o += " " + f.host.serial().writes().back();
-         o += std::to_string(f.readInt("SP_Gap").value_or(-1));
-         o += " " + std::to_string(f.host.storage().has("XTOK", "gap"));
-         return o += " | " + f.receives();
-     },
-     "ok \rx\x03"
-     "25 0 | Connected open, EF"},
+     "start rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03; play 02 41 42 03 02 43 44 03; "
+     "fault store; w SP_Gap 25; w SP_TxPrefix 0D; w SP_Done 1; w tx_token x; stop; go; sent; "
+     "r SP_Gap; stored gap; play 02 45 46 03; tokens",
+     "0D7803 | 25 | - | EF"},
     {"StorageReadsFailAndRetainedTextsFallBackToEmpty",
-     [](Faults& f) {
-         f.host.storage().put("XTOK", "tx_prefix", "0D");
-         f.host.storage().failReads = true;
-         f.startWithTwoTokens();
-         f.writeText("tx_token", "x");
-         std::string o = f.readText("SP_TxPrefix").value_or("?");
-         o += "|" + f.host.serial().written();
-         return o += " | " + f.state();
-     },
-     "|x\x03 | Connected open, AB CD"},
+     "store tx_prefix 0D; fault load; start rx_prefix=02 rx_suffix=03 tx_suffix=03; "
+     "play 02 41 42 03; w tx_token x; r SP_TxPrefix; sent; tokens",
+     "'' | 7803 | AB"},
     {"BasicStorageReadsFailToo",
-     [](Faults& f) {
-         f.host.storage().extended = false;
-         f.host.storage().put("XTOK", "tx_prefix", "0D");
-         f.host.storage().failReads = true;
-         f.startWithTwoTokens();
-         std::string o = f.readText("SP_TxPrefix").value_or("?");
-         return o += "| " + f.state();
-     },
-     "| Connected open, AB CD"},
+     "fault basic; store tx_prefix 0D; fault load; start rx_prefix=02 rx_suffix=03; "
+     "play 02 41 42 03; r SP_TxPrefix; tokens",
+     "'' | AB"},
     {"TaskRefusedStartsWithoutReceiving",
-     [](Faults& f) {
-         f.startWithTwoTokens();
-         f.protocol->Stop();
-         f.host.tasks().refuseTasks = true;
-         std::string o = f.said(f.protocol->Start());
-         const long reads = f.host.serial().record().reads;
-         f.host.serial().feed(
-             "\x02"
-             "EF\x03");
-         o += " | " + f.state();
-         o += " " + std::to_string(f.host.serial().record().reads - reads);
-         f.protocol->Stop();
-         f.host.tasks().refuseTasks = false;
-         f.protocol->Start();
-         f.host.serial().waitDrained();
-         return o += " | " + f.state();
-     },
-     "ok | Connected open, AB CD 0 | Connected open, EF"},
-    {"StopTimesOutButClosesThePortAndTheQueueStays",
-     [](Faults& f) {
-         f.startWithTwoTokens();
-         f.host.tasks().stopTimesOut = true;
-         std::string o = f.said(f.protocol->Stop());
-         o += " " + f.command("get_stat");
-         FakeTask* task = f.host.tasks().lastTask();
-         f.host.tasks().stopTimesOut = false;
-         f.destroy();  // the protocol ends the task the host could not
-         return o += " " + std::to_string(task->waitEnded(5000));
-     },
-     "ok Disconnected 1"},
+     "start rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03; play 02 41 42 03 02 43 44 03; "
+     "stop; fault task; go; feed 02 45 46 03; cmd get_stat; tokens; stop; heal task; go; drain; "
+     "tokens",
+     "Connected | AB,CD | EF"},
 };
 
-class FaultTable : public Faults, public ::testing::WithParamInterface<FaultCase> {};
+INSTANTIATE_TEST_SUITE_P(Faults, Scenarios, ::testing::ValuesIn(kFaults), scenarioName);
 
-TEST_P(FaultTable, LeavesThePanelWhatItExpects) {
-    EXPECT_EQ(GetParam().run(*this), GetParam().outcome);
+class Faults : public ProtocolFixture {};
+
+TEST_F(Faults, StopTimesOutButClosesThePortAndTheTaskEndsWithTheProtocol) {
+    EXPECT_EQ(run("start; play 41; fault stop; stop; cmd get_stat; heal stop; opens"),
+              "Disconnected | 1/1 com1");
+    FakeTask* task = host.tasks().lastTask();
+    destroy();  // the protocol ends the task the host could not
+    EXPECT_TRUE(task->waitEnded(5000));
 }
 
-INSTANTIATE_TEST_SUITE_P(Rows, FaultTable, ::testing::ValuesIn(kFaults),
-                         [](const auto& info) { return std::string(info.param.name); });
-
-// A required service refused: Init fails with the name and gives back what it
-// took; without the optional ones (storage among them) the protocol does its
-// whole job.
-TEST(ServiceFaults, RequiredRefusedFailsInitOptionalMissingIsFine) {
-    ProtModule& module = rootObject().module();
-    for (auto [service, text] : {std::pair{"IMultiTask2", "IMultiTask2 not created"},
-                                 {"ISerialFactory", "ISerialFactory not created"},
-                                 {"ISocketFactory", "ISocketFactory not created"},
-                                 {"ICDSBuffer", "piCDSBuffer not created"}}) {
-        FakeHost host;
-        host.refuse(service);
-        EXPECT_EQ(module.Init(&host), 0);
-        EXPECT_STREQ(module.GetErrorText(), text);
-        EXPECT_EQ(host.outstanding(), 0);
-        EXPECT_EQ(rootObject().factory().CreateProtocol("XTOK"), nullptr);
-    }
-    EXPECT_EQ(module.Init(nullptr), 0);
-    EXPECT_STREQ(module.GetErrorText(), "IMultiTask2 not created");
+// Without the optional services (storage among them) settings still apply
+// and hold while the protocol lives.
+TEST(ServiceFaults, WithoutTheOptionalServicesTheProtocolDoesItsWholeJob) {
     FakeHost host;
     for (const char* name :
          {"IDiag", "IPermanentStorage", "IDriverInterface", "ISmux", "IFastTimer"}) {

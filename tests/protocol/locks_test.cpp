@@ -39,13 +39,13 @@ protected:
     std::vector<int> consume(int last, const std::atomic<bool>& stop) {
         std::vector<int> seen;
         while (!stop && (seen.empty() || seen.back() != last)) {
-            const int number = tokenNumber(readText("rx_token", 16).value_or("!"));
+            const int number = tokenNumber(read("rx_token?string-16"));
             if (number == -2) {
                 std::this_thread::yield();
                 continue;
             }
             seen.push_back(number);
-            writeBool("token_ack", true);
+            write("token_ack?boolean", "1");
         }
         return seen;
     }
@@ -61,14 +61,16 @@ protected:
 TEST_F(Locks, ATokenTypeAccessTakesTheQueueLockOnce) {
     ASSERT_TRUE(start("autoConnect=false"));
     FakeMutex& queue = *host.tasks().mutex(0);
-    for (const char* uri :
-         {"0?tokens_available?unsignedInt", "0?rx_token_len?unsignedInt", "0?rx_token?string-64"}) {
+    for (const char* spec :
+         {"tokens_available?unsignedInt", "rx_token_len?unsignedInt", "rx_token?string-64"}) {
+        tag("0?" + std::string(spec));
         const long before = queue.locks;
-        read(uri, 1);
-        EXPECT_EQ(queue.locks - before, 1) << uri;
+        read(spec);
+        EXPECT_EQ(queue.locks - before, 1) << spec;
     }
+    tag("0?token_ack?boolean");
     const long before = queue.locks;
-    writeBool("token_ack", true);
+    write("token_ack?boolean", "1");
     EXPECT_EQ(queue.locks - before, 1);
 }
 
@@ -79,8 +81,8 @@ TEST_F(Locks, WithRoomForAllEveryTokenArrivesOnceInOrder) {
     std::atomic<int> torn{0};
     std::thread reader([&] {
         while (!stop) {
-            torn += tokenNumber(readText("rx_token", 16).value_or("!")) == -1;
-            torn += readInt("tokens_available").value_or(-1) < 0;
+            torn += tokenNumber(read("rx_token?string-16")) == -1;
+            torn += std::atoi(read("tokens_available?unsignedInt").c_str()) < 0;
         }
     });
     host.serial().feed(framedTokens(0, 2000));
@@ -104,14 +106,18 @@ TEST_F(Locks, EverythingAtOnce) {
     std::vector<std::thread> workers;
     workers.emplace_back([&] {  // applies settings, which clears the queue
         for (int32_t gap = 1; !stop; gap = gap % 20 + 1) {
-            bad += !(writeInt("SP_Gap", gap) && writeText("SP_RxSuffix", "03", 8) &&
-                     writeBool("SP_Done", true));
-            bad += readText("SP_RxSuffix", 8) != "03";
+            std::string failed = write("SP_Gap?unsignedInt", std::to_string(gap));
+            failed += write("SP_RxSuffix?string-8", "03");
+            failed += write("SP_Done?boolean", "1");
+            bad += !failed.empty();
+            bad += read("SP_RxSuffix?string-8") != "03";
         }
     });
     workers.emplace_back([&] {  // the only one that changes the connection
         for (; toggles < 100 && !stop; ++toggles) {
-            bad += !(writeBool("connect", false) && writeBool("connect", true));
+            std::string failed = write("connect?boolean", "0");
+            failed += write("connect?boolean", "1");
+            bad += !failed.empty();
         }
     });
     workers.emplace_back([&] {  // the console, reading the same queue
@@ -134,10 +140,10 @@ TEST_F(Locks, EverythingAtOnce) {
     consumer.join();
     EXPECT_EQ(bad, 0);
     expectInOrder(seen);
-    ASSERT_TRUE(writeBool("SP_Done", true));  // still receiving afterwards
+    ASSERT_EQ(write("SP_Done?boolean", "1"), "");  // still receiving afterwards
     host.serial().feed(framedTokens(2000, 1));
     ASSERT_TRUE(host.serial().waitDrained());
-    EXPECT_EQ(readText("rx_token", 16), "T02000");
+    EXPECT_EQ(read("rx_token?string-16"), "T02000");
 }
 
 }  // namespace

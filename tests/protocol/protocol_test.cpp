@@ -7,67 +7,36 @@
 namespace xtok::test {
 namespace {
 
-class Protocol : public ProtocolFixture {
-protected:
-    /// CreateTask and StopTask calls with their arguments.
-    std::vector<std::string> taskCalls() {
-        std::vector<std::string> out;
-        for (const std::string& c : host.tasks().calls()) {
-            if (c.find("Task") != std::string::npos) {
-                out.push_back(c);
-            }
-        }
-        return out;
-    }
+const Scenario kLifecycle[] = {
+    // Stop before Start has nothing to do; a second Start or Stop neither.
+    {"StartOpensThePortAndRunsTheTaskAndStopUndoesBoth",
+     "conf; stop; go; go; opens; r connect; stop; stop; opens; tasks; r tokens_available; err; "
+     "go; opens",
+     "1/0 com1 | 1 | 1/1 com1 | CreateTask 3 0,StopTask 1000 | !Protocol not started | -3 Protocol "
+     "not started | 2/1 com1"},
+    {"WithoutAutoConnectTheTaskRunsWithThePortClosed",
+     "start autoConnect=false; opens; r connect; cmd connect ON; play 41 42; tokens",
+     "0/0 - | 0 | OK | AB"},
+    {"ThePortIsOpenedWithTheFiveNumbersAndReportedByName",
+     "cfg CfgVer=1 model=1 port=com2 baudrate=19200 parity=none bits=7 stopbits=2 mode=RS-485; "
+     "go; cfgd; line; opens; new; "
+     "cfg CfgVer=1 model=1 port=com3 baudrate=115200 parity=odd bits=8 stopbits=1 mode=RS-422; "
+     "go; cfgd; line; new; "
+     "cfg CfgVer=1 model=1 port=com16 baudrate=150 parity=mark bits=7 stopbits=1 mode=RS-232; "
+     "go; cfgd; line",
+     "19200/0/7/2/1 | com2,19200,none,7,2,RS-485 | 1/0 com2 | 115200/2/8/1/2 | "
+     "com3,115200,odd,8,1,RS-422 | 150/3/7/1/0 | com16,150,mark,7,1,RS-232"},
 };
 
-TEST_F(Protocol, StartOpensThePortAndRunsTheTaskAndStopUndoesBoth) {
-    ASSERT_TRUE(configure());
-    EXPECT_TRUE(protocol->Stop());  // before Start: nothing to do
-    ASSERT_TRUE(protocol->Start() && protocol->Start());
-    EXPECT_EQ(host.serial().record().names, std::vector<std::string>{"com1"});
-    EXPECT_EQ(readBool("connect"), true);
-    EXPECT_TRUE(protocol->Stop() && protocol->Stop());
-    EXPECT_FALSE(host.serial().isOpen());
-    EXPECT_EQ(taskCalls(), (std::vector<std::string>{"CreateTask 3 0", "StopTask 1000"}));
-    EXPECT_TRUE(host.tasks().lastTask()->waitEnded(0));
-    EXPECT_EQ(readInt("tokens_available"), std::nullopt);
-    EXPECT_EQ(code(), -3);
-    EXPECT_TRUE(protocol->Start());
-    EXPECT_EQ(host.serial().record().opens, 2);
-}
+INSTANTIATE_TEST_SUITE_P(Protocol, Scenarios, ::testing::ValuesIn(kLifecycle), scenarioName);
 
-TEST_F(Protocol, AFailedOpenFailsStartWithoutATaskAndALaterStartTriesAgain) {
-    ASSERT_TRUE(configure());
-    for (std::atomic<bool>* fault : {&host.serial().refuseOpen, &host.serial().failConfigure}) {
-        *fault = true;
-        EXPECT_FALSE(protocol->Start());
-        EXPECT_EQ(code(), -1);
-        EXPECT_EQ(error(), "Can't open serial port");
-        EXPECT_FALSE(host.serial().isOpen());
-        EXPECT_EQ(readBool("connect"), std::nullopt);  // still not started
-        *fault = false;
-    }
-    EXPECT_TRUE(taskCalls().empty());
-    EXPECT_TRUE(protocol->Start());
-    EXPECT_EQ(taskCalls(), std::vector<std::string>{"CreateTask 3 0"});
-}
-
-TEST_F(Protocol, WithoutAutoConnectTheTaskIdlesWithThePortClosed) {
-    ASSERT_TRUE(start("autoConnect=false"));
-    EXPECT_EQ(host.serial().record().opens, 0);
-    EXPECT_EQ(readBool("connect"), false);
-    EXPECT_TRUE(eventually([&] { return host.tasks().idleSleeps() >= 2; }));
-    EXPECT_EQ(host.serial().record().reads, 0);
-    EXPECT_EQ(command("connect ON"), "OK");
-    play("41 42");
-    EXPECT_EQ(takeTokens(), std::vector<std::string>{"AB"});
-}
+class Protocol : public ProtocolFixture {};
 
 TEST_F(Protocol, DestroyingARunningProtocolEndsItsTaskAndGivesBackItsLocks) {
     EXPECT_EQ(host.tasks().calls(), (std::vector<std::string>{"CreateMutex 0", "CreateMutex 0"}));
     ASSERT_TRUE(start());
     FakeTask* task = host.tasks().lastTask();
+    EXPECT_TRUE(protocol->Stop() && protocol->Start());
     rootObject().factory().DestroyProtocol(protocol);
     protocol = nullptr;
     EXPECT_TRUE(task->waitEnded(0));
@@ -75,33 +44,11 @@ TEST_F(Protocol, DestroyingARunningProtocolEndsItsTaskAndGivesBackItsLocks) {
     EXPECT_EQ(host.tasks().mutexesAlive(), 0);
 }
 
-TEST_F(Protocol, ThePortIsOpenedWithTheFiveNumbersAndReportedByName) {
-    struct Case {
-        const char* keys;
-        LineSettings line;
-        const char* text;
-    };
-    const Case cases[] = {
-        {"port=com2 baudrate=19200 parity=none bits=7 stopbits=2 mode=RS-485",
-         {19200, 0, 7, 2, 1},
-         "com2,19200,none,7,2,RS-485"},
-        {"port=com3 baudrate=115200 parity=odd bits=8 stopbits=1 mode=RS-422",
-         {115200, 2, 8, 1, 2},
-         "com3,115200,odd,8,1,RS-422"},
-        {"port=com16 baudrate=150 parity=mark bits=7 stopbits=1 mode=RS-232",
-         {150, 3, 7, 1, 0},
-         "com16,150,mark,7,1,RS-232"},
-    };
-    for (const Case& c : cases) {
-        destroy();
-        create();
-        ASSERT_TRUE(protocol->Configure((std::string("CfgVer=1 model=1 ") + c.keys).c_str()));
-        ASSERT_TRUE(protocol->Start()) << error();
-        EXPECT_TRUE(host.serial().configured().back() == c.line) << c.keys;
-        EXPECT_EQ(settingsText(), c.text);
-    }
-    const std::string full = "com16,150,mark,7,1,RS-232";
-    for (int32_t length : {0, 5, 25, 26}) {  // cut at the caller's length, terminated when room
+// Cut at the caller's length, terminated when there is room.
+TEST_F(Protocol, SerialSettingsAreCutAtTheCallersLength) {
+    ASSERT_TRUE(configure());
+    const std::string full = "com1,9600,even,8,1,RS-232";
+    for (int32_t length : {0, 5, 25, 26}) {
         std::string buffer(40, 'x');
         EXPECT_TRUE(protocol->GetSerialSettings(buffer.data(), length));
         const std::size_t copied = std::min<std::size_t>(length, full.size());
@@ -146,7 +93,7 @@ TEST_F(Protocol, ConfigurationErrorsSayWhy) {
         EXPECT_EQ(code(), -1);
         EXPECT_EQ(error(), message) << text;
     }
-    EXPECT_EQ(settingsText().substr(0, 10), "com7,4800,");  // what was read before stays
+    EXPECT_EQ(run("line").substr(0, 10), "com7,4800,");  // what was read before stays
     EXPECT_TRUE(
         configure("token_queue_size=10000 rx_prefix=0d0A tx_prefix=none gap=0x14 "
                   "Node1::model=1"));
