@@ -28,10 +28,6 @@ private:
     std::string error_;
 };
 
-/// Names a library file exports to other programs: the defined symbols of an
-/// ELF dynamic symbol table, or a Windows DLL's export names.
-std::vector<std::string> exportedSymbols(const std::string& path);
-
 /// The whole file as bytes; empty when it cannot be read.
 std::string readWholeFile(const std::string& path);
 
