@@ -6,7 +6,7 @@ namespace xtok::test {
 
 namespace {
 
-enum Event { kSilence = 256, kError, kHangUp };
+enum Event { kSilence = 256, kError, kHangUp, kHold };
 
 }  // namespace
 
@@ -66,6 +66,24 @@ void FakeSerialFactory::hangUp() {
     push({kHangUp});
 }
 
+void FakeSerialFactory::hold(const std::string& bytes) {
+    std::vector<int> events(reinterpret_cast<const uint8_t*>(bytes.data()),
+                            reinterpret_cast<const uint8_t*>(bytes.data()) + bytes.size());
+    events.push_back(kHold);
+    push(events);
+}
+
+bool FakeSerialFactory::waitHeld() {
+    std::unique_lock<std::mutex> lock(mutex_);
+    return changed_.wait_for(lock, std::chrono::seconds(5), [this] { return held_; });
+}
+
+void FakeSerialFactory::release(int byte) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    released_ = byte;
+    changed_.notify_all();
+}
+
 std::size_t FakeSerialFactory::pending() const {
     std::lock_guard<std::mutex> lock(mutex_);
     return script_.size();
@@ -89,6 +107,13 @@ bool FakeSerialFactory::ReadByte(uint8_t* destination, int32_t timeoutMs, int32_
     const int event = script_.front();
     script_.pop_front();
     record_.hungUp = record_.hungUp || event == kHangUp;
+    if (event == kHold) {
+        held_ = true;
+        changed_.notify_all();
+        changed_.wait_for(lock, std::chrono::seconds(5), [this] { return released_ > -2; });
+        *destination = static_cast<uint8_t>(released_);
+        return released_ >= 0;
+    }
     if (event >= kSilence) {
         return false;
     }

@@ -43,6 +43,11 @@ public:
     void readError();  ///< fails at once, as a port that reports a line error does
     /// From this event on every read fails at once, until the port is opened again.
     void hangUp();
+    /// `bytes`, then a read that waits, holding the reader's lock, until
+    /// release() gives it a byte (or -1: a time-out) or five seconds passed.
+    void hold(const std::string& bytes);
+    bool waitHeld();
+    void release(int byte);
     std::size_t pending() const;
     /// Waits (bounded) until the script is read and one more read found it
     /// empty: the reader has acted on all of it.
@@ -72,6 +77,8 @@ private:
     std::condition_variable changed_;
     std::deque<int> script_;  ///< a byte, or one of the events below
     bool readAfterEmpty_ = false;
+    bool held_ = false;
+    int released_ = -2;  ///< the byte release() gave, -2 before
     LineRecord record_;
 };
 
