@@ -9,8 +9,10 @@
 // again; one that finds none waits --poll-us (1000), a runtime's scan cycle.
 //
 // Prints "ready" once the port is open and the receive task runs, then one
-// JSON line with the result (the fields of bench/token_check.h) once token
-// COUNT-1 has arrived, or after --idle-ms without data once data has begun.
+// JSON line with the result (the fields of bench/token_check.h and the
+// process's resident memory once a quarter of the tokens arrived and at the
+// end, for the soak run) once token COUNT-1 has arrived, or after --idle-ms
+// without data once data has begun.
 #include <sys/resource.h>
 #include <time.h>
 
@@ -19,6 +21,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <fstream>
 #include <string>
 #include <vector>
 
@@ -57,6 +60,17 @@ bool parse(int argc, char** argv, Options& o) {
         }
     }
     return o.count > 0 && o.pollUs > 0;
+}
+
+long residentKb() {
+    std::ifstream status("/proc/self/status");
+    std::string line;
+    while (std::getline(status, line)) {
+        if (line.rfind("VmRSS:", 0) == 0) {
+            return std::strtol(line.c_str() + 6, nullptr, 10);
+        }
+    }
+    return -1;
 }
 
 void sleepUs(int us) {
@@ -114,6 +128,8 @@ int main(int argc, char** argv) {
     const uint8_t one = 1;
     char text[64];
     uint64_t lastDataNs = 0;
+    uint32_t taken = 0;
+    long warmKb = -1;
     for (;;) {
         uint32_t n = 0;
         if (!protocol->ReadTag(available, &n)) {
@@ -128,6 +144,7 @@ int main(int argc, char** argv) {
                     return 1;
                 }
                 check.token(text, std::strlen(text), bench::nowNs());
+                warmKb = ++taken == opt.count / 4 ? residentKb() : warmKb;
             }
             lastDataNs = bench::nowNs();
             if (check.done()) {
@@ -141,7 +158,10 @@ int main(int argc, char** argv) {
             sleepUs(opt.pollUs);  // a busy runtime scans again at once
         }
     }
-    std::printf("%s\n", check.json("xtokline").c_str());
+    std::string result = check.json("xtokline");
+    result.insert(result.size() - 1, ", \"rss_warm_kb\": " + std::to_string(warmKb) +
+                                          ", \"rss_end_kb\": " + std::to_string(residentKb()));
+    std::printf("%s\n", result.c_str());
     std::fflush(stdout);
     protocol->Stop();
     return 0;
