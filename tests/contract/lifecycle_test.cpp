@@ -3,7 +3,9 @@
 // by their slot numbers in turn.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <array>
+#include <cstring>
 
 #include "tests/support/fake_host.h"
 #include "tests/support/plugin_library.h"
@@ -21,7 +23,7 @@ const uint8_t kOne = 1;
 class Runtime {
 public:
     // Module slots 4 Init, 5 Exit; factory slots 4 CreateProtocol, 5 DestroyProtocol.
-    Runtime(FakeHost& host, const std::string& parameters) {
+    Runtime(FakeHost& host, const std::string& parameters) : host_(host) {
         bool held = module && callSlot<int32_t>(module, 4, static_cast<IServiceProvider*>(&host));
         protocol = held ? callSlot<void*>(factory, 4, "XTOK") : nullptr;
         ok = protocol && call(kConfigure, (kLine + parameters).c_str());
@@ -48,6 +50,26 @@ public:
         return value;
     }
 
+    /// The device sends `frame`; the panel polls, reads and acknowledges the
+    /// token, then answers: the token and what the line then carries.
+    std::string exchange(const std::string& frame, const char* answer) {
+        FakeSerialFactory& line = host_.serial();
+        line.feed(frame);
+        EXPECT_TRUE(line.waitDrained());
+        void* available = tag("0?tokens_available?unsignedInt");
+        EXPECT_EQ(read<uint32_t>(available), 1u);
+        const uint32_t length = read<uint32_t>(tag("0?rx_token_len?unsignedInt"));
+        std::string token = read<Text>(tag("0?rx_token?string-64")).data();
+        EXPECT_EQ(length, token.size());
+        EXPECT_TRUE(call(kWriteTag, tag("0?token_ack?boolean"), &kOne));
+        EXPECT_EQ(read<uint32_t>(available), 0u);
+        Text value{};
+        std::copy(answer, answer + std::strlen(answer), value.begin());
+        const std::size_t before = line.written().size();
+        EXPECT_TRUE(call(kWriteTag, tag("0?tx_token?string-16"), value.data()));
+        return token + " " + line.written().substr(before);
+    }
+
     static inline const std::string kLine =
         "CfgVer=1 model=1 port=com2 baudrate=19200 parity=odd bits=7 stopbits=2 mode=RS-485 ";
     PluginLibrary lib;
@@ -55,72 +77,41 @@ public:
     void* factory = lib.rootInterface("IProtocolFactory");
     void* protocol = nullptr;
     bool ok = false;
+    FakeHost& host_;
 };
 
-TEST(Lifecycle, RefusedPortThenARetryAndTheConsole) {
-    FakeHost host;
-    Runtime rt(host, "");
-    ASSERT_TRUE(rt.ok) << rt.error();
-    host.serial().refuseOpen = true;
-    EXPECT_FALSE(rt.call(kStart));
-    host.serial().refuseOpen = false;
-    EXPECT_TRUE(rt.call(kStart)) << rt.error();
-    EXPECT_EQ(host.serial().configured(), (std::vector<LineSettings>{{19200, 2, 7, 2, 1}}));
-    Text reply{};
-    EXPECT_TRUE(rt.call(kDoCommand, "get_stat", reply.data(), int32_t{64}));
-    EXPECT_STREQ(reply.data(), "Connected");
-    // The protocol hands out the size line of the block, right after its header.
-    EXPECT_STREQ(rt.call<const char*>(kXmlDescription) - 77,
-                 "<<ICOM_XML_START>>Name=XTOK?FullName=Xtokline?Version=106?Platform=PX40_WCE6");
-}
-
-// The device frames a token; the panel polls, reads and acknowledges it, then
-// sends its answer, which reaches the line framed.
-TEST(Lifecycle, TokensBothWaysInRawAndHexMode) {
-    const struct {
-        const char* framing;
-        std::string deviceSends, token;
-        char answer[16];
-        std::string lineGets;
-    } rows[] = {
-        {"rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=0D0A", "\2HELLO\3", "HELLO", "WORLD",
-         "\2WORLD\r\n"},
-        {"rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03 hex_tokens=true",
-         std::string("\2\0\n\377A\3", 6), "000AFF41", "4142", "\2AB\3"},
-    };
-    for (const auto& row : rows) {
-        FakeHost host;
-        Runtime rt(host, row.framing);
-        ASSERT_TRUE(rt.ok && rt.call(kStart)) << rt.error();
-        void* available = rt.tag("0?tokens_available?unsignedInt");
-        host.serial().feed(row.deviceSends);
-        ASSERT_TRUE(host.serial().waitDrained());
-        EXPECT_EQ(rt.read<uint32_t>(available), 1u);
-        EXPECT_EQ(rt.read<uint32_t>(rt.tag("0?rx_token_len?unsignedInt")), row.token.size());
-        EXPECT_EQ(rt.read<Text>(rt.tag("0?rx_token?string-64")).data(), row.token);
-        EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?token_ack?boolean"), &kOne));
-        EXPECT_EQ(rt.read<uint32_t>(available), 0u);
-        EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?tx_token?string-16"), row.answer));
-        EXPECT_EQ(host.serial().written(), row.lineGets) << row.framing;
-    }
-}
-
-// The second session loads the library afresh: only the host's storage can
-// carry the settings over.
-TEST(Lifecycle, SettingsAppliedWithDoneSurviveARestart) {
+// A panel's day: a refused port and a retry, the console, a token each way,
+// settings applied with SP_Done; then the library is loaded afresh, so that
+// only the host's storage carries the settings over, and hex mode, now on,
+// shows every byte of a binary token.
+TEST(Lifecycle, APanelsDayByTheSlotNumbers) {
     FakeHost host;
     {
-        Runtime rt(host, "");
-        ASSERT_TRUE(rt.ok && rt.call(kStart)) << rt.error();
+        Runtime rt(host, "rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=0D0A");
+        ASSERT_TRUE(rt.ok) << rt.error();
+        host.serial().refuseOpen = true;
+        EXPECT_FALSE(rt.call(kStart));
+        host.serial().refuseOpen = false;
+        EXPECT_TRUE(rt.call(kStart)) << rt.error();
+        Text reply{};
+        EXPECT_TRUE(rt.call(kDoCommand, "get_stat", reply.data(), int32_t{64}));
+        EXPECT_STREQ(reply.data(), "Connected");
+        // The protocol hands out the size line of the block, right after its header.
+        EXPECT_STREQ(
+            rt.call<const char*>(kXmlDescription) - 77,
+            "<<ICOM_XML_START>>Name=XTOK?FullName=Xtokline?Version=106?Platform=PX40_WCE6");
+        EXPECT_EQ(rt.exchange("\2HELLO\3", "WORLD"), "HELLO \2WORLD\r\n");
         const uint32_t rate = 57600;
         EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?SP_Baud?unsignedInt"), &rate));
-        EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?SP_RxPrefix?string-10"), "02\0\0\0\0\0\0\0"));
+        EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?SP_HexTokens?boolean"), &kOne));
         EXPECT_TRUE(rt.call(kWriteTag, rt.tag("0?SP_Done?boolean"), &kOne));
     }
-    Runtime rt(host, "");
+    EXPECT_EQ(host.serial().configured(),
+              (std::vector<LineSettings>{{19200, 2, 7, 2, 1}, {57600, 2, 7, 2, 1}}));
+    Runtime rt(host, "rx_prefix=02 rx_suffix=03 tx_prefix=02 tx_suffix=03");
     ASSERT_TRUE(rt.ok && rt.call(kStart)) << rt.error();
     EXPECT_EQ(host.serial().configured().back().baud, 57600);
-    EXPECT_STREQ(rt.read<Text>(rt.tag("0?SP_RxPrefix?string-10")).data(), "02");
+    EXPECT_EQ(rt.exchange(std::string("\2\0\n\377A\3", 6), "4142"), "000AFF41 \2AB\3");
 }
 
 }  // namespace
