@@ -3,11 +3,10 @@
 #include <cstdlib>
 #include <ostream>
 
-#include "protocol/settings.h"
 #include "tools/interrupt.h"
 #include "tools/json_line.h"
+#include "tools/settings_view.h"
 #include "tools/token_view.h"
-#include "xtokline/constants.h"
 #include "xtokline/text.h"
 
 namespace xtok::tools {
@@ -27,7 +26,7 @@ const char* const kHostHelp =
     "  watch [--count N] [--timeout SECONDS]\n"
     "                             show received tokens (time, text, hex) and acknowledge\n"
     "                             them, until Ctrl-C, N tokens or the time-out\n"
-    "  settings                   the line settings: active, and the SP_ values\n"
+    "  settings                   each setting: active and where from, staged, retained\n"
     "  help                       this text and the plug-in's console commands\n"
     "  quit                       leave (also exit, or the end of input)\n"
     "Values: numbers in decimal or 0x hex; booleans 0/1, true/false, on/off;\n"
@@ -35,26 +34,6 @@ const char* const kHostHelp =
     "\\xHH \\n \\r \\t \\\\; arrays as numbers separated by blanks or commas; binary as hex.\n"
     "Any other line goes to the plug-in's console, whose read and write take\n"
     "raw hex data:\n";
-
-// The address that reads a setting's SP_ memory type. Texts are sized for
-// any prefix an operator would configure.
-std::string settingAddress(const Setting& setting) {
-    const char* type = "string-256";
-    switch (setting.kind) {
-        case SettingKind::Number:
-            type = "unsignedInt";
-            break;
-        case SettingKind::Byte:
-            type = "unsignedByte";
-            break;
-        case SettingKind::Flag:
-            type = "boolean";
-            break;
-        case SettingKind::Hex:
-            break;
-    }
-    return std::string("0?") + setting.memoryType + "?" + type;
-}
 
 std::vector<std::string> splitWords(const std::string& line) {
     std::vector<std::string> words;
@@ -86,17 +65,6 @@ std::string restAfterWords(const std::string& line, int skip) {
         return rest.substr(1, rest.size() - 2);
     }
     return rest;
-}
-
-/// The name of a parity or mode code, as the configuration writes them.
-std::string codeName(const std::string& tag, unsigned code) {
-    if (tag == "SP_Par" && code < kParityCount) {
-        return kParityNames[code];
-    }
-    if (tag == "SP_Mode" && code < kModeCount) {
-        return kModeNames[code];
-    }
-    return "";
 }
 
 bool parseCount(const std::string& text, long& number) {
@@ -281,28 +249,13 @@ bool ConsoleSession::watch(const std::string& line, const std::vector<std::strin
 bool ConsoleSession::settings(const std::string& line) {
     char active[256] = {};
     session_.protocol().GetSerialSettings(active, sizeof active - 1);
-    JsonLine json;
-    json.text("command", line).flag("ok", true).text("active", active);
-    std::string text = "active line        " + std::string(active) + "\n";
-    for (const Setting& setting : kSettings) {
-        TagValue value;
-        std::string error;
-        if (!session_.read(settingAddress(setting), value, error)) {
-            return fail(line, error);
-        }
-        // Prefixes and suffixes are hex texts already: shown as they stand.
-        bool isText = value.shape.code == 10;
-        std::string shown =
-            isText ? stringValue(value.bytes) : formatValue(value.shape, value.bytes);
-        shown = isText && shown.empty() ? "(none)" : shown;
-        std::string name = codeName(setting.memoryType, value.bytes.empty() ? 0 : value.bytes[0]);
-        json.raw(setting.memoryType, formatValueJson(value.shape, value.bytes));
-        text += std::string(setting.memoryType) +
-                std::string(19 - std::string(setting.memoryType).size(), ' ') + shown +
-                (name.empty() ? "" : " (" + name + ")") + "\n";
-    }
-    text += "SP_ values written here wait for SP_Done, which applies and keeps them.\n";
-    report(json.str(), text);
+    report(JsonLine()
+               .text("command", line)
+               .flag("ok", true)
+               .text("active", active)
+               .raw("settings", settingsJson(session_.settings()))
+               .str(),
+           settingsText(session_.settings(), active));
     return true;
 }
 

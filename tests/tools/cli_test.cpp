@@ -180,10 +180,51 @@ TEST_F(Session, JsonGivesOneObjectPerResult) {
     EXPECT_NE(lines[1].find("\"token\":\"ACK A\\u0001\",\"length\":6"), std::string::npos)
         << lines[1];
     EXPECT_NE(lines[2].find("\"ok\":true,\"tokens\":1"), std::string::npos) << lines[2];
-    EXPECT_NE(lines[3].find("\"SP_Baud\":9600"), std::string::npos) << lines[3];
+    EXPECT_NE(lines[3].find("\"SP_Baud\":{\"key\":\"baudrate\",\"active\":9600"), std::string::npos)
+        << lines[3];
     EXPECT_NE(lines[4].find("\"ok\":false,\"error\":\"bad tag address"), std::string::npos)
         << lines[4];
     EXPECT_EQ(done.err, "");
+}
+
+// The console's setters and the SP_ writes pass through xtok-host, which
+// follows them; what it says is active is what the plug-in then receives by.
+TEST_F(Session, SettingsTellWhereEachActiveValueCameFrom) {
+    std::string error;
+    auto storage = host::PermanentStorage::open(dir_.file("retained.sqlite3"), error);
+    ASSERT_TRUE(storage && storage->WriteInt("XTOK", "gap", 70)) << error;
+    storage.reset();
+    Finished done =
+        runTool(run({"--json", "--exec",
+                     "set_rxPrefix 05; tag write 0?SP_TokenQueueSize?unsignedInt 50; "
+                     "settings; tag write 0?SP_Done?boolean 1; settings; "
+                     "tag write 0?tx_token?string-8 HI; watch --count 1 --timeout 10"}));
+    std::vector<std::string> lines = linesOf(done.out);
+    ASSERT_EQ(lines.size(), 8u) << done.out << done.err;
+    auto setting = [](const char* type, const std::string& rest) {
+        return std::string("\"") + type + "\":{\"key\":" + rest;
+    };
+    const std::pair<std::string, std::string> kSeen[] = {
+        {lines[2], setting("SP_Baud", "\"baudrate\",\"active\":9600,\"source\":\"configuration\"")},
+        {lines[2], setting("SP_Gap",
+                           "\"gap\",\"active\":70,\"source\":\"retained file\","
+                           "\"staged\":null,\"retained\":70}")},
+        {lines[2],
+         setting("SP_RxPrefix", "\"rx_prefix\",\"active\":\"05\",\"source\":\"console\"")},
+        {lines[2], setting("SP_TokenQueueSize",
+                           "\"token_queue_size\",\"active\":100,"
+                           "\"source\":\"default\",\"staged\":50,\"retained\":null}")},
+        {lines[4], setting("SP_TokenQueueSize",
+                           "\"token_queue_size\",\"active\":50,"
+                           "\"source\":\"SP_ write\",\"staged\":50,\"retained\":50}")},
+        // SP_Done returns a console change to the starting value.
+        {lines[4],
+         setting("SP_RxPrefix", "\"rx_prefix\",\"active\":\"02\",\"source\":\"configuration\"")},
+        {lines[6], "\"token\":\"ACK HI\""},
+    };
+    for (const auto& [line, part] : kSeen) {
+        EXPECT_NE(line.find(part), std::string::npos) << part << "\n" << line;
+    }
 }
 
 TEST_F(Session, AScriptOnStandardInputGoesOnAfterAFailureAndSaysSoAtTheEnd) {
