@@ -83,9 +83,9 @@ bool parseSeconds(const std::string& text, double& seconds) {
 
 }  // namespace
 
-ConsoleSession::ConsoleSession(PluginSession& session, bool json, std::ostream& out,
-                               std::ostream& err)
-    : session_(session), json_(json), out_(out), err_(err) {}
+ConsoleSession::ConsoleSession(PluginSession& session, const PluginDescription& description,
+                               bool json, std::ostream& out, std::ostream& err)
+    : session_(session), description_(description), json_(json), out_(out), err_(err) {}
 
 bool ConsoleSession::run(LineInput& input) {
     bool allGood = true;
@@ -109,7 +109,7 @@ bool ConsoleSession::execute(const std::string& raw) {
         return true;
     }
     if (word == "help") {
-        return help(line);
+        return help(line, words);
     }
     if (word == "tag") {
         return tag(line, words);
@@ -144,7 +144,7 @@ void ConsoleSession::report(const std::string& json, const std::string& text) {
     }
 }
 
-bool ConsoleSession::help(const std::string& line) {
+bool ConsoleSession::help(const std::string& line, const std::vector<std::string>&) {
     bool ok = false;
     std::string plugin = session_.command("help", ok);
     std::string text = kHostHelp + plugin;

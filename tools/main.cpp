@@ -5,8 +5,10 @@
 #include <cstring>
 #include <iostream>
 
+#include "tools/closest_word.h"
 #include "tools/demo.h"
 #include "tools/describe.h"
+#include "tools/fault_report.h"
 #include "tools/interrupt.h"
 #include "tools/plugin_path.h"
 #include "tools/ports.h"
@@ -38,19 +40,68 @@ std::string positive(std::string& value) {
 
 /// CLI11 takes an unknown first word for a stray argument and asks for a
 /// subcommand; say what is wrong instead.
-bool knownCommand(int argc, char** argv) {
+bool knownCommand(const CLI::App& app, int argc, char** argv) {
     if (argc < 2 || argv[1][0] == '-') {
         return true;
     }
-    static const char* const kCommands[] = {"demo", "run", "describe", "ports"};
-    for (const char* name : kCommands) {
-        if (std::strcmp(argv[1], name) == 0) {
-            return true;
-        }
+    std::vector<std::string> names;
+    for (const CLI::App* command : app.get_subcommands([](const CLI::App*) { return true; })) {
+        names.push_back(command->get_name());
     }
-    std::cerr << "xtok-host: unknown command '" << argv[1]
-              << "'; the commands are demo, run, describe and ports" << std::endl;
+    if (std::find(names.begin(), names.end(), argv[1]) != names.end()) {
+        return true;
+    }
+    std::string all;
+    for (const std::string& name : names) {
+        all += (all.empty() ? "" : ", ") + name;
+    }
+    std::cerr << "xtok-host: " << unknownWord("command", argv[1], names)
+              << " (the commands: " << all << ")" << std::endl;
     return false;
+}
+
+CLI::App* addDemo(CLI::App& app, DemoOptions& demo) {
+    CLI::App* command = app.add_subcommand(
+        "demo",
+        "A simulated reader on a pseudo-terminal, driven through the plug-in; no hardware "
+        "needed");
+    command->add_option("--count", demo.count, "Stop after this many codes (default: Ctrl-C)")
+        ->check(CLI::Validator(positive, "N"));
+    command->add_option("--interval", demo.intervalMs, "Milliseconds between the reader's codes")
+        ->check(CLI::Range(20, 60000))
+        ->capture_default_str();
+    command->add_option("--plugin", demo.pluginPath,
+                        "The plug-in file (default: beside xtok-host)");
+    return command;
+}
+
+CLI::App* addRun(CLI::App& app, RunOptions& run, const PluginDescription& description) {
+    CLI::App* command = app.add_subcommand(
+        "run",
+        "The plug-in on a serial line with a console: typed tag reads and writes, watch, "
+        "settings, and the plug-in's own commands. Without --config the editor's defaults "
+        "fill the line; options set single keys.");
+    command->footer(
+        "Console: tag read ADDRESS, tag write ADDRESS VALUE, watch [--count N] [--timeout S], "
+        "settings, help [datatypes|memorytypes], quit; any other line goes to the plug-in's own "
+        "console. Exit status 1 when any command failed.");
+    addLineOptions(*command, run.line, description);
+    command->add_option(
+        "--exec", run.exec,
+        "Commands separated by ';' (\\; for one inside a value) instead of standard input");
+    command->add_flag("--json", run.json, "One JSON object per result, one per line");
+    return command;
+}
+
+int startRun(const CLI::App& command, RunOptions& run, const PluginAtHand& plugin) {
+    if (!plugin.described) {
+        reportFaults({plugin.error}, run.json, std::cout, std::cerr);
+        return 1;
+    }
+    run.line.pluginPath = plugin.path;
+    SessionOptions session;
+    std::vector<std::string> faults = lineFaults(command, run.line, plugin.description, session);
+    return runConsole(run, session, plugin.description, faults, std::cout, std::cerr);
 }
 
 /// --plugin when given, else the plug-in beside this program.
@@ -66,50 +117,18 @@ bool pluginPath(std::string& path) {
 }  // namespace
 
 int main(int argc, char** argv) {
+    const PluginAtHand plugin = findPluginAtHand(argc, argv);
     CLI::App app{
         "xtok-host loads the xtokline serial token plug-in as an operator panel's runtime "
-        "does, on this PC's serial ports."};
+        "does, on this PC's serial ports.",
+        "xtok-host"};
     app.require_subcommand(1);
     app.footer("Exit status: 0 success, 1 a failure, 2 unusable arguments.");
 
     DemoOptions demo;
-    CLI::App* demoCommand =
-        app.add_subcommand("demo",
-                           "A simulated reader on a pseudo-terminal, driven through the plug-in; "
-                           "no hardware needed");
-    demoCommand->add_option("--count", demo.count, "Stop after this many codes (default: Ctrl-C)")
-        ->check(CLI::Validator(positive, "N"));
-    demoCommand
-        ->add_option("--interval", demo.intervalMs, "Milliseconds between the reader's codes")
-        ->check(CLI::Range(20, 60000))
-        ->capture_default_str();
-    demoCommand->add_option("--plugin", demo.pluginPath,
-                            "The plug-in file (default: beside xtok-host)");
-
+    CLI::App* demoCommand = addDemo(app, demo);
     RunOptions run;
-    CLI::App* runCommand = app.add_subcommand(
-        "run",
-        "The plug-in on a serial line with a console: typed tag reads and writes, "
-        "watch, settings, and the plug-in's own commands");
-    runCommand->footer(
-        "Console: tag read ADDRESS, tag write ADDRESS VALUE, watch [--count N] [--timeout S], "
-        "settings, help, quit; any other line goes to the plug-in's own console. help "
-        "explains the values. Exit status 1 when any command failed.");
-    runCommand->add_option("--config", run.config, "Configuration text, or @FILE holding it")
-        ->required();
-    runCommand->add_option("--map", run.maps,
-                           "Device of a port name, e.g. com1=/dev/ttyUSB0 (repeatable)");
-    runCommand->add_option("--state", run.statePath,
-                           "SQLite file for retained settings (default: "
-                           "$XDG_STATE_HOME/xtokline/retained.sqlite3)");
-    runCommand->add_option("--plugin", run.pluginPath,
-                           "The plug-in file (default: beside xtok-host)");
-    runCommand->add_option("--instance", run.instanceName,
-                           "Instance name, under which settings are retained (default: XTOK)");
-    runCommand->add_option(
-        "--exec", run.exec,
-        "Commands separated by ';' (\\; for one inside a value) instead of standard input");
-    runCommand->add_flag("--json", run.json, "One JSON object per result, one per line");
+    CLI::App* runCommand = addRun(app, run, plugin.description);
 
     std::string describePath;
     bool wholeXml = false;
@@ -121,7 +140,7 @@ int main(int argc, char** argv) {
 
     CLI::App* portsCommand = app.add_subcommand("ports", "The serial ports of this machine");
 
-    if (!knownCommand(argc, argv)) {
+    if (!knownCommand(app, argc, argv)) {
         return kUsageError;
     }
     try {
@@ -141,5 +160,5 @@ int main(int argc, char** argv) {
     if (*demoCommand) {
         return pluginPath(demo.pluginPath) ? runDemo(demo, std::cout, std::cerr) : 1;
     }
-    return pluginPath(run.pluginPath) ? runConsole(run, std::cout, std::cerr) : 1;
+    return startRun(*runCommand, run, plugin);
 }

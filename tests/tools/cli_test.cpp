@@ -187,6 +187,52 @@ TEST_F(Session, JsonGivesOneObjectPerResult) {
     EXPECT_EQ(done.err, "");
 }
 
+// Each option of the short form sets what its key in a configuration text
+// sets; without options the editor's defaults make the line.
+TEST_F(Session, EachOptionSetsWhatItsKeyDoes) {
+    const std::pair<std::vector<std::string>, std::string> kOptions[] = {
+        {{"--baud", "19200"}, "baudrate=19200"},
+        {{"--baudrate", "4800"}, "baudrate=4800"},
+        {{"--stop", "2"}, "stopbits=2"},
+        {{"--stopbits", "2"}, "stopbits=2"},
+        {{"--mode", "RS-422"}, "mode=RS-422"},
+        {{"--prefix", "02"}, "rx_prefix=02"},
+        {{"--rx-prefix", "1B"}, "rx_prefix=1B"},
+        {{"--suffix", "0d0a"}, "rx_suffix=0d0a"},
+        {{"--rx-suffix", "03"}, "rx_suffix=03"},
+        {{"--tx-prefix", "02"}, "tx_prefix=02"},
+        {{"--tx-suffix", "03"}, "tx_suffix=03"},
+        {{"--gap", "40"}, "gap=40"},
+        {{"--hex-tokens"}, "hex_tokens=true"},
+        {{"--queue-size", "7"}, "token_queue_size=7"},
+        {{"--token-queue-size", "9"}, "token_queue_size=9"},
+        {{"--no-auto-connect"}, "autoConnect=false"},
+    };
+    auto settingsWith = [&](std::vector<std::string> how) {
+        how.insert(how.begin(), {kHost, "run", "--plugin", kPlugin, "--state",
+                                 dir_.file("retained.sqlite3"), "--exec", "settings; get_stat"});
+        return runTool(how).out;
+    };
+    const std::string device = line_->slavePath();
+    // The line with `key` in place of its default.
+    auto text = [&device](const std::string& key) {
+        std::string text = "CfgVer=1 model=1 port=" + device + " " + key;
+        for (std::string entry :
+             {"baudrate=9600", "parity=none", "bits=8", "stopbits=1", "mode=RS-232"}) {
+            text += key.rfind(entry.substr(0, entry.find('=') + 1), 0) == 0 ? "" : " " + entry;
+        }
+        return text;
+    };
+    const std::string defaults = settingsWith({device, "--parity", "none"});
+    EXPECT_EQ(settingsWith({"--config", text("")}), defaults);
+    for (auto [option, key] : kOptions) {
+        option.insert(option.end(), {device, "--parity", "none"});
+        const std::string byOption = settingsWith(option);
+        EXPECT_EQ(byOption, settingsWith({"--config", text(key)})) << key;
+        EXPECT_NE(byOption, defaults) << key;
+    }
+}
+
 // The console's setters and the SP_ writes pass through xtok-host, which
 // follows them; what it says is active is what the plug-in then receives by.
 TEST_F(Session, SettingsTellWhereEachActiveValueCameFrom) {
@@ -264,6 +310,23 @@ TEST(Cli, PortsListsWhatThereIsAndSaysWhatItCannot) {
     EXPECT_NE(done.out.find("Pseudo-terminals (/dev/pts/N) are not listed"), std::string::npos);
 }
 
+TEST(Cli, EveryConfigurationFaultIsToldAtOnceBeforeThePluginStarts) {
+    Finished done = runTool({kHost, "run", "--plugin", kPlugin, "--config",
+                             "CfgVer=1 model=1 port=/dev/null baudrat=9600 parity=EVEN", "--bits",
+                             "9", "--suffix", "0d0", "--queue-size", "0"});
+    EXPECT_EQ(done.status, 2);
+    EXPECT_EQ(linesOf(done.err),
+              (std::vector<std::string>{
+                  "xtok-host: unknown key 'baudrat'; did you mean 'baudrate'?",
+                  "xtok-host: parity 'EVEN' is not one of none, even, odd",
+                  "xtok-host: bits '9' is not one of 7, 8",
+                  "xtok-host: rx_suffix '0d0' is not hex: pairs of 0-9 and A-F, or none",
+                  "xtok-host: token_queue_size '0' is out of range 1 to 10000",
+                  "xtok-host: missing mandatory key 'baudrate'",
+                  "xtok-host: missing mandatory key 'stopbits'",
+                  "xtok-host: missing mandatory key 'mode'"}));
+}
+
 // Every bad input: one line on standard error, its reason, the right status.
 // In the arguments, {line} is a free pseudo-terminal, {busy} one that another
 // program holds, {locked} a file the user may not open, {dir} a scratch
@@ -281,20 +344,33 @@ const std::string kNoPort =
 
 const BadInput kBadInputs[] = {
     {"missing device", {"run", "--config", kNoPort + " port={dir}/ttyNONE"}, "No such file", 1},
-    {"unknown port name", {"run", "--config", kNoPort + " port=com17"}, "unknown port name", 1},
+    {"unknown port name", {"run", "--config", kNoPort + " port=com17"}, "unknown port name", 2},
     {"busy port", {"run", "--config", kNoPort + " port={busy}"}, "in use by another program", 1},
     {"no permission",
      {"run", "--config", kNoPort + " port={locked}"},
      "Permission denied",
      1,
      true},
-    {"no port in the configuration", {"run", "--config", kNoPort}, "'port' is not found", 1},
+    {"no port in the configuration",
+     {"run", "--config", kNoPort},
+     "missing mandatory key 'port'",
+     2},
+    {"no device", {"run"}, "name the device", 2},
     {"bad parity",
      {"run", "--config",
       "CfgVer=1 model=1 port={line} baudrate=9600 parity=EVEN bits=8 stopbits=1 mode=RS-232"},
-     "'parity' has invalid value",
-     1},
-    {"no configuration at all", {"run", "--config", "hello"}, "unknown format", 1},
+     "parity 'EVEN' is not one of none, even, odd",
+     2},
+    {"misspelled key",
+     {"run", "--config", kNoPort + " port={line} baudrat=9600"},
+     "unknown key 'baudrat'; did you mean 'baudrate'?",
+     2},
+    {"misspelled option",
+     {"run", "{line}", "--baudrat", "9600"},
+     "unknown option '--baudrat'; did you mean '--baudrate'?",
+     2},
+    {"blank in a value", {"run", "{line}", "--prefix", "02 gap=9"}, "cannot be written", 2},
+    {"no configuration at all", {"run", "--config", "hello"}, "unknown format", 2},
     {"bad tag address",
      {"run", "--config", kNoPort + " port={line}", "--exec", "tag read 0?x?int"},
      "bad tag address '0?x?int'",
@@ -304,22 +380,19 @@ const BadInput kBadInputs[] = {
       "tag write 0?SP_Baud?unsignedInt fast"},
      "'fast' is not a number",
      1},
-    {"text as plug-in",
-     {"run", "--plugin", "{text}", "--config", kNoPort + " port={line}"},
-     "is not a shared object",
-     1},
+    {"text as plug-in", {"run", "--plugin", "{text}", "{line}"}, "no description block", 1},
     {"text described", {"describe", "{text}"}, "no description block", 1},
     {"missing plug-in", {"describe", "{dir}/none.so"}, "No such file", 1},
     {"unknown command", {"bogus"}, "unknown command 'bogus'", 2},
     {"unknown option", {"demo", "--colour"}, "--colour", 2},
-    {"no configuration option", {"run"}, "--config is required", 2},
     {"count of zero", {"demo", "--count", "0"}, "whole number above 0", 2},
     {"watch count of zero",
      {"run", "--config", kNoPort + " port={line}", "--exec", "watch --count 0"},
      "--count",
      1},
-    {"bad port map", {"run", "--config", kNoPort, "--map", "com99=/dev/x"}, "comN=DEVICE", 2},
+    {"bad port map", {"run", "{line}", "--map", "com99=/dev/x"}, "comN=DEVICE", 2},
     {"configuration file missing", {"run", "--config", "@{dir}/none.cfg"}, "cannot read", 2},
+    {"endless configuration file", {"run", "--config", "@/dev/zero"}, "larger than 1 MiB", 2},
 };
 
 class BadInputs : public ::testing::Test {
