@@ -3,6 +3,7 @@
 #include <cstdlib>
 #include <ostream>
 
+#include "tools/help_topics.h"
 #include "tools/interrupt.h"
 #include "tools/json_line.h"
 #include "tools/settings_view.h"
@@ -28,6 +29,8 @@ const char* const kHostHelp =
     "                             them, until Ctrl-C, N tokens or the time-out\n"
     "  settings                   each setting: active and where from, staged, retained\n"
     "  help                       this text and the plug-in's console commands\n"
+    "  help datatypes             the data types of a tag address\n"
+    "  help memorytypes           the plug-in's memory types\n"
     "  quit                       leave (also exit, or the end of input)\n"
     "Values: numbers in decimal or 0x hex; booleans 0/1, true/false, on/off;\n"
     "strings as the rest of the line (\"quotes\" keep outer blanks) with the escapes\n"
@@ -144,11 +147,22 @@ void ConsoleSession::report(const std::string& json, const std::string& text) {
     }
 }
 
-bool ConsoleSession::help(const std::string& line, const std::vector<std::string>&) {
-    bool ok = false;
-    std::string plugin = session_.command("help", ok);
-    std::string text = kHostHelp + plugin;
-    report(JsonLine().text("command", line).flag("ok", true).text("help", text).str(), text);
+bool ConsoleSession::help(const std::string& line, const std::vector<std::string>& words) {
+    JsonLine json;
+    json.text("command", line).flag("ok", true);
+    const std::string topic = words.size() > 1 ? words[1] : "";
+    if (topic == "datatypes") {
+        report(json.raw("datatypes", dataTypesJson()).str(), dataTypesText());
+    } else if (topic == "memorytypes") {
+        report(json.raw("memorytypes", memoryTypesJson(description_)).str(),
+               memoryTypesText(description_));
+    } else if (words.size() == 1) {
+        bool ok = false;
+        const std::string text = kHostHelp + session_.command("help", ok);
+        report(json.text("help", text).str(), text);
+    } else {
+        return fail(line, "help takes datatypes or memorytypes, or nothing");
+    }
     return true;
 }
 

@@ -170,10 +170,11 @@ TEST_F(Session, CtrlCEndsAWatchAndTheScriptGoesOn) {
 TEST_F(Session, JsonGivesOneObjectPerResult) {
     Finished done = runTool(run({"--json", "--exec",
                                  "tag write 0?tx_token?string-16 \"A\\x01\"; watch --count 1 "
-                                 "--timeout 10; settings; tag read 0?nope?int"}));
+                                 "--timeout 10; settings; tag read 0?nope?int; help datatypes; "
+                                 "help memorytypes"}));
     EXPECT_EQ(done.status, 1);
     std::vector<std::string> lines = linesOf(done.out);
-    ASSERT_EQ(lines.size(), 5u) << done.out;
+    ASSERT_EQ(lines.size(), 7u) << done.out;
     for (const std::string& line : lines) {
         EXPECT_TRUE(line.front() == '{' && line.back() == '}') << line;
     }
@@ -184,6 +185,9 @@ TEST_F(Session, JsonGivesOneObjectPerResult) {
         << lines[3];
     EXPECT_NE(lines[4].find("\"ok\":false,\"error\":\"bad tag address"), std::string::npos)
         << lines[4];
+    EXPECT_NE(lines[5].find("\"datatypes\":[\"boolean\",\"byte\""), std::string::npos);
+    EXPECT_NE(lines[5].find("\"string-N\",\"binary-N\",\"time\""), std::string::npos);
+    EXPECT_NE(lines[6].find("{\"name\":\"SP_Done\",\"type\":\"boolean\""), std::string::npos);
     EXPECT_EQ(done.err, "");
 }
 
