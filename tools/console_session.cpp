@@ -238,6 +238,7 @@ bool ConsoleSession::watch(const std::string& line, const std::vector<std::strin
             ++seen;
             report(JsonLine()
                        .text("command", line)
+                       .flag("ok", true)
                        .text("time", isoTime(token.arrived))
                        .text("token", token.text)
                        .number("length", token.length)

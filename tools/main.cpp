@@ -1,11 +1,12 @@
 // xtok-host: the xtokline plug-in on a PC, loaded exactly as a panel runtime
-// loads it. Subcommands: demo, run, describe, ports.
+// loads it. Subcommands: demo, run, describe, ports, completion.
 #include <CLI/CLI.hpp>
 #include <cstdlib>
 #include <cstring>
 #include <iostream>
 
 #include "tools/closest_word.h"
+#include "tools/completion.h"
 #include "tools/demo.h"
 #include "tools/describe.h"
 #include "tools/fault_report.h"
@@ -13,6 +14,7 @@
 #include "tools/plugin_path.h"
 #include "tools/ports.h"
 #include "tools/run_command.h"
+#include "tools/version.h"
 #include "xtokline/text.h"
 
 namespace {
@@ -22,10 +24,10 @@ using namespace xtok::tools;
 constexpr int kUsageError = 2;
 
 /// CLI11 explains in several lines; a wrong argument deserves one.
-int usageError(const CLI::ParseError& e) {
+int usageError(const CLI::ParseError& e, bool json) {
     std::string what = e.what();
     std::replace(what.begin(), what.end(), '\n', ' ');
-    std::cerr << "xtok-host: " << what << " (xtok-host --help explains)" << std::endl;
+    reportFaults({what + " (xtok-host --help explains)"}, json, std::cout, std::cerr);
     return kUsageError;
 }
 
@@ -40,7 +42,7 @@ std::string positive(std::string& value) {
 
 /// CLI11 takes an unknown first word for a stray argument and asks for a
 /// subcommand; say what is wrong instead.
-bool knownCommand(const CLI::App& app, int argc, char** argv) {
+bool knownCommand(const CLI::App& app, int argc, char** argv, bool json) {
     if (argc < 2 || argv[1][0] == '-') {
         return true;
     }
@@ -55,8 +57,8 @@ bool knownCommand(const CLI::App& app, int argc, char** argv) {
     for (const std::string& name : names) {
         all += (all.empty() ? "" : ", ") + name;
     }
-    std::cerr << "xtok-host: " << unknownWord("command", argv[1], names)
-              << " (the commands: " << all << ")" << std::endl;
+    reportFaults({unknownWord("command", argv[1], names) + " (the commands: " + all + ")"}, json,
+                 std::cout, std::cerr);
     return false;
 }
 
@@ -114,9 +116,22 @@ bool pluginPath(std::string& path) {
     return false;
 }
 
+void addVersions(CLI::App& app, const PluginAtHand& plugin) {
+    auto text = [&plugin] {
+        return versionText(plugin.path, plugin.described ? &plugin.description : nullptr);
+    };
+    app.set_version_flag("--version", text);
+    for (CLI::App* command : app.get_subcommands([](CLI::App*) { return true; })) {
+        command->set_version_flag("--version", text);
+    }
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
+    const bool json = std::find_if(argv + 1, argv + argc, [](const char* a) {
+                          return std::strcmp(a, "--json") == 0;
+                      }) != argv + argc;
     const PluginAtHand plugin = findPluginAtHand(argc, argv);
     CLI::App app{
         "xtok-host loads the xtokline serial token plug-in as an operator panel's runtime "
@@ -138,20 +153,33 @@ int main(int argc, char** argv) {
                                 "The plug-in file (default: beside xtok-host)");
     describeCommand->add_flag("--xml", wholeXml, "Print the whole XML description");
 
+    bool portsJson = false;
     CLI::App* portsCommand = app.add_subcommand("ports", "The serial ports of this machine");
+    portsCommand->add_flag("--json", portsJson, "One JSON object with the ports");
 
-    if (!knownCommand(app, argc, argv)) {
+    CLI::App* completionCommand = app.add_subcommand(
+        "completion", "A completion script: source <(xtok-host completion bash)");
+    completionCommand->add_option("shell", "The shell; bash is the one there is")
+        ->required()
+        ->check(CLI::IsMember({"bash"}));
+    addVersions(app, plugin);
+
+    if (!knownCommand(app, argc, argv, json)) {
         return kUsageError;
     }
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& e) {
-        return e.get_exit_code() == 0 ? app.exit(e) : usageError(e);
+        return e.get_exit_code() == 0 ? app.exit(e) : usageError(e, json);
     }
 
     catchInterrupts();
+    if (*completionCommand) {
+        std::cout << bashCompletion(app);
+        return 0;
+    }
     if (*portsCommand) {
-        return runPorts(std::cout, std::cerr);
+        return runPorts(portsJson, std::cout, std::cerr);
     }
     if (*describeCommand) {
         return pluginPath(describePath) ? runDescribe(describePath, wholeXml, std::cout, std::cerr)

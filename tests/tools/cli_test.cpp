@@ -314,6 +314,35 @@ TEST(Cli, PortsListsWhatThereIsAndSaysWhatItCannot) {
     EXPECT_NE(done.out.find("Pseudo-terminals (/dev/pts/N) are not listed"), std::string::npos);
 }
 
+TEST(Cli, EveryCommandTellsItsVersionAndThePluginsOwn) {
+    for (const char* command : {"demo", "run", "describe", "ports", "completion"}) {
+        Finished done = runTool({kHost, command, "--version"});
+        EXPECT_EQ(done.status, 0) << command;
+        EXPECT_EQ(done.out, "xtok-host " XTOK_VERSION "\nplug-in XTOK (Xtokline) version 106: " +
+                                kPlugin + "\n");
+    }
+}
+
+TEST(Cli, UnderJsonEveryResultIsOneObjectOnStandardOutput) {
+    const std::vector<std::string> kFailures[] = {
+        {"bogus", "--json"},
+        {"ports", "--json", "--all"},
+        {"run", "--json", "--baudrat=1"},
+        {"run", "--json", "--plugin", kPlugin, "/dev/null/tty", "--parity", "none"},
+    };
+    for (std::vector<std::string> arguments : kFailures) {
+        arguments.insert(arguments.begin(), kHost);
+        Finished done = runTool(arguments);
+        EXPECT_NE(done.status, 0) << arguments[1];
+        EXPECT_EQ(done.err, "") << arguments[1];
+        EXPECT_EQ(done.out.rfind("{\"ok\":false,\"error\":\"", 0), 0u) << done.out;
+        EXPECT_EQ(linesOf(done.out).size(), 1u) << done.out;
+    }
+    Finished ports = runTool({kHost, "ports", "--json"});
+    EXPECT_EQ(ports.status, 0);
+    EXPECT_EQ(ports.out.rfind("{\"ok\":true,\"ports\":[", 0), 0u) << ports.out;
+}
+
 TEST(Cli, EveryConfigurationFaultIsToldAtOnceBeforeThePluginStarts) {
     Finished done = runTool({kHost, "run", "--plugin", kPlugin, "--config",
                              "CfgVer=1 model=1 port=/dev/null baudrat=9600 parity=EVEN", "--bits",
@@ -329,6 +358,20 @@ TEST(Cli, EveryConfigurationFaultIsToldAtOnceBeforeThePluginStarts) {
                   "xtok-host: missing mandatory key 'baudrate'",
                   "xtok-host: missing mandatory key 'stopbits'",
                   "xtok-host: missing mandatory key 'mode'"}));
+}
+
+TEST(Cli, TheCompletionScriptOffersTheCommandsAndTheirOptions) {
+    auto offered = [](const std::string& words) {
+        return runTool({"/bin/bash", "-c",
+                        "source <(" + kHost + " completion bash) && COMP_WORDS=(" + words +
+                            ") && COMP_CWORD=$((${#COMP_WORDS[@]} - 1)) && _xtok_host && "
+                            "echo ${COMPREPLY[*]}"})
+            .out;
+    };
+    EXPECT_EQ(offered("xtok-host com"), "completion\n");
+    EXPECT_EQ(offered("xtok-host run --qu"), "--queue-size\n");
+    EXPECT_EQ(offered("xtok-host run --no"), "--no-auto-connect\n");
+    EXPECT_EQ(offered("xtok-host ports --"), "--help --json --version\n");
 }
 
 // Every bad input: one line on standard error, its reason, the right status.
