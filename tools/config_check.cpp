@@ -130,9 +130,8 @@ struct Checker {
     }
 
     void missing(const ConfigText& config) {
-        const std::string marker = ConfigText::kMarker;
         for (const ParameterInfo& p : description.parameters) {
-            if (p.mandatory && !config.find(p.key) && marker.rfind(p.key + "=", 0) != 0) {
+            if (p.mandatory && !config.find(p.key) && !ConfigText::isMarkerKey(p.key)) {
                 fault(p.key,
                       "missing mandatory key '" + p.key + "'" +
                           (p.key == kPortKey ? ": name the device, e.g. xtok-host run /dev/ttyUSB0"

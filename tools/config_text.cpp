@@ -62,6 +62,10 @@ ConfigText::ConfigText(const std::string& text) {
     }
 }
 
+bool ConfigText::isMarkerKey(const std::string& key) {
+    return std::strncmp(kMarker, (key + "=").c_str(), key.size() + 1) == 0;
+}
+
 const std::string* ConfigText::find(const std::string& key) const {
     for (const ConfigEntry& entry : entries_) {
         if (entry.node.empty() && entry.key == key) {

@@ -23,6 +23,9 @@ public:
 
     explicit ConfigText(const std::string& text = kMarker);
 
+    /// Whether `key` is the one the marker spells: the section never holds it.
+    static bool isMarkerKey(const std::string& key);
+
     /// Whether the text holds the marker at all.
     bool versioned() const { return versioned_; }
     const std::vector<ConfigEntry>& entries() const { return entries_; }

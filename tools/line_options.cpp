@@ -1,10 +1,12 @@
 #include "tools/line_options.h"
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <cctype>
 #include <cerrno>
 #include <cstring>
 #include <fstream>
+#include <utility>
 
 #include "tools/closest_word.h"
 #include "tools/config_check.h"
@@ -108,10 +110,9 @@ bool readConfigText(const std::string& option, std::string& text, std::string& e
 /// only the user can name.
 ConfigText editorDefaults(const PluginDescription& description) {
     ConfigText config;
-    const std::string marker = ConfigText::kMarker;
     for (const ParameterInfo& p : description.parameters) {
         if (p.mandatory && !p.defaultValue.empty() && p.key != kPortKey &&
-            marker.rfind(p.key + "=", 0) != 0) {
+            !ConfigText::isMarkerKey(p.key)) {
             config.set(p.key, p.defaultValue);
         }
     }
@@ -161,9 +162,8 @@ void addLineOptions(CLI::App& command, LineOptions& options, const PluginDescrip
     command.add_option("--config", options.config,
                        "Configuration text, or @FILE holding it; the options below override its "
                        "keys");
-    const std::string marker = ConfigText::kMarker;
     for (const ParameterInfo& p : description.parameters) {
-        if (p.key != kPortKey && marker.rfind(p.key + "=", 0) != 0) {
+        if (p.key != kPortKey && !ConfigText::isMarkerKey(p.key)) {
             addKeyOption(command, p, description, options.keys);
         }
     }

@@ -1,7 +1,7 @@
 // xtok-host: the xtokline plug-in on a PC, loaded exactly as a panel runtime
 // loads it. Subcommands: demo, run, describe, ports, completion.
 #include <CLI/CLI.hpp>
-#include <cstdlib>
+#include <algorithm>
 #include <cstring>
 #include <iostream>
 
