@@ -3,11 +3,11 @@
 #include <cstdlib>
 #include <ostream>
 
-#include "protocol/settings.h"
+#include "tools/help_topics.h"
 #include "tools/interrupt.h"
 #include "tools/json_line.h"
+#include "tools/settings_view.h"
 #include "tools/token_view.h"
-#include "xtokline/constants.h"
 #include "xtokline/text.h"
 
 namespace xtok::tools {
@@ -27,34 +27,16 @@ const char* const kHostHelp =
     "  watch [--count N] [--timeout SECONDS]\n"
     "                             show received tokens (time, text, hex) and acknowledge\n"
     "                             them, until Ctrl-C, N tokens or the time-out\n"
-    "  settings                   the line settings: active, and the SP_ values\n"
+    "  settings                   each setting: active and where from, staged, retained\n"
     "  help                       this text and the plug-in's console commands\n"
+    "  help datatypes             the data types of a tag address\n"
+    "  help memorytypes           the plug-in's memory types\n"
     "  quit                       leave (also exit, or the end of input)\n"
     "Values: numbers in decimal or 0x hex; booleans 0/1, true/false, on/off;\n"
     "strings as the rest of the line (\"quotes\" keep outer blanks) with the escapes\n"
     "\\xHH \\n \\r \\t \\\\; arrays as numbers separated by blanks or commas; binary as hex.\n"
     "Any other line goes to the plug-in's console, whose read and write take\n"
     "raw hex data:\n";
-
-// The address that reads a setting's SP_ memory type. Texts are sized for
-// any prefix an operator would configure.
-std::string settingAddress(const Setting& setting) {
-    const char* type = "string-256";
-    switch (setting.kind) {
-        case SettingKind::Number:
-            type = "unsignedInt";
-            break;
-        case SettingKind::Byte:
-            type = "unsignedByte";
-            break;
-        case SettingKind::Flag:
-            type = "boolean";
-            break;
-        case SettingKind::Hex:
-            break;
-    }
-    return std::string("0?") + setting.memoryType + "?" + type;
-}
 
 std::vector<std::string> splitWords(const std::string& line) {
     std::vector<std::string> words;
@@ -88,17 +70,6 @@ std::string restAfterWords(const std::string& line, int skip) {
     return rest;
 }
 
-/// The name of a parity or mode code, as the configuration writes them.
-std::string codeName(const std::string& tag, unsigned code) {
-    if (tag == "SP_Par" && code < kParityCount) {
-        return kParityNames[code];
-    }
-    if (tag == "SP_Mode" && code < kModeCount) {
-        return kModeNames[code];
-    }
-    return "";
-}
-
 bool parseCount(const std::string& text, long& number) {
     int32_t whole = 0;
     std::size_t used = 0;
@@ -115,9 +86,9 @@ bool parseSeconds(const std::string& text, double& seconds) {
 
 }  // namespace
 
-ConsoleSession::ConsoleSession(PluginSession& session, bool json, std::ostream& out,
-                               std::ostream& err)
-    : session_(session), json_(json), out_(out), err_(err) {}
+ConsoleSession::ConsoleSession(PluginSession& session, const PluginDescription& description,
+                               bool json, std::ostream& out, std::ostream& err)
+    : session_(session), description_(description), json_(json), out_(out), err_(err) {}
 
 bool ConsoleSession::run(LineInput& input) {
     bool allGood = true;
@@ -141,7 +112,7 @@ bool ConsoleSession::execute(const std::string& raw) {
         return true;
     }
     if (word == "help") {
-        return help(line);
+        return help(line, words);
     }
     if (word == "tag") {
         return tag(line, words);
@@ -176,11 +147,22 @@ void ConsoleSession::report(const std::string& json, const std::string& text) {
     }
 }
 
-bool ConsoleSession::help(const std::string& line) {
-    bool ok = false;
-    std::string plugin = session_.command("help", ok);
-    std::string text = kHostHelp + plugin;
-    report(JsonLine().text("command", line).flag("ok", true).text("help", text).str(), text);
+bool ConsoleSession::help(const std::string& line, const std::vector<std::string>& words) {
+    JsonLine json;
+    json.text("command", line).flag("ok", true);
+    const std::string topic = words.size() > 1 ? words[1] : "";
+    if (topic == "datatypes") {
+        report(json.raw("datatypes", dataTypesJson()).str(), dataTypesText());
+    } else if (topic == "memorytypes") {
+        report(json.raw("memorytypes", memoryTypesJson(description_)).str(),
+               memoryTypesText(description_));
+    } else if (words.size() == 1) {
+        bool ok = false;
+        const std::string text = kHostHelp + session_.command("help", ok);
+        report(json.text("help", text).str(), text);
+    } else {
+        return fail(line, "help takes datatypes or memorytypes, or nothing");
+    }
     return true;
 }
 
@@ -256,6 +238,7 @@ bool ConsoleSession::watch(const std::string& line, const std::vector<std::strin
             ++seen;
             report(JsonLine()
                        .text("command", line)
+                       .flag("ok", true)
                        .text("time", isoTime(token.arrived))
                        .text("token", token.text)
                        .number("length", token.length)
@@ -281,28 +264,13 @@ bool ConsoleSession::watch(const std::string& line, const std::vector<std::strin
 bool ConsoleSession::settings(const std::string& line) {
     char active[256] = {};
     session_.protocol().GetSerialSettings(active, sizeof active - 1);
-    JsonLine json;
-    json.text("command", line).flag("ok", true).text("active", active);
-    std::string text = "active line        " + std::string(active) + "\n";
-    for (const Setting& setting : kSettings) {
-        TagValue value;
-        std::string error;
-        if (!session_.read(settingAddress(setting), value, error)) {
-            return fail(line, error);
-        }
-        // Prefixes and suffixes are hex texts already: shown as they stand.
-        bool isText = value.shape.code == 10;
-        std::string shown =
-            isText ? stringValue(value.bytes) : formatValue(value.shape, value.bytes);
-        shown = isText && shown.empty() ? "(none)" : shown;
-        std::string name = codeName(setting.memoryType, value.bytes.empty() ? 0 : value.bytes[0]);
-        json.raw(setting.memoryType, formatValueJson(value.shape, value.bytes));
-        text += std::string(setting.memoryType) +
-                std::string(19 - std::string(setting.memoryType).size(), ' ') + shown +
-                (name.empty() ? "" : " (" + name + ")") + "\n";
-    }
-    text += "SP_ values written here wait for SP_Done, which applies and keeps them.\n";
-    report(json.str(), text);
+    report(JsonLine()
+               .text("command", line)
+               .flag("ok", true)
+               .text("active", active)
+               .raw("settings", settingsJson(session_.settings()))
+               .str(),
+           settingsText(session_.settings(), active));
     return true;
 }
 

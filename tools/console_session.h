@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "tools/line_input.h"
+#include "tools/plugin_description.h"
 #include "tools/plugin_session.h"
 
 namespace xtok::tools {
@@ -15,7 +16,9 @@ namespace xtok::tools {
 class ConsoleSession {
 public:
     /// With `json`, every result is one JSON object on one line of `out`.
-    ConsoleSession(PluginSession& session, bool json, std::ostream& out, std::ostream& err);
+    /// `description` is the plug-in's, for "help memorytypes".
+    ConsoleSession(PluginSession& session, const PluginDescription& description, bool json,
+                   std::ostream& out, std::ostream& err);
 
     /// Runs lines until the input ends or "quit"; true when none failed.
     bool run(LineInput& input);
@@ -24,7 +27,7 @@ public:
     bool quitRequested() const { return quit_; }
 
 private:
-    bool help(const std::string& line);
+    bool help(const std::string& line, const std::vector<std::string>& words);
     bool tag(const std::string& line, const std::vector<std::string>& words);
     bool tagRead(const std::string& line, const std::string& address);
     bool tagWrite(const std::string& line, const std::string& address, const std::string& value);
@@ -36,6 +39,7 @@ private:
     void report(const std::string& json, const std::string& text);
 
     PluginSession& session_;
+    const PluginDescription& description_;
     bool json_;
     std::ostream& out_;
     std::ostream& err_;

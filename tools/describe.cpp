@@ -1,16 +1,11 @@
 #include "tools/describe.h"
 
-#include <sys/stat.h>
 #include <zlib.h>
 
-#include <cerrno>
-#include <cstring>
-#include <fstream>
 #include <iomanip>
 #include <ostream>
-#include <sstream>
 
-#include "tools/xml_scan.h"
+#include "tools/plugin_description.h"
 
 namespace xtok::tools {
 
@@ -23,27 +18,6 @@ const std::string kEnd = "<<ICOM_XML_END>>";
 // from filling memory.
 constexpr std::size_t kMaxXml = 16u << 20;
 constexpr std::size_t kMaxHeader = 4096;
-constexpr std::size_t kMaxFile = 1u << 30;
-
-bool readFile(const std::string& path, std::string& bytes, std::string& error) {
-    struct stat info;
-    if (stat(path.c_str(), &info) != 0) {
-        error = std::strerror(errno);
-        return false;
-    }
-    if (!S_ISREG(info.st_mode) || static_cast<std::size_t>(info.st_size) > kMaxFile) {
-        error = "not a plug-in file";
-        return false;
-    }
-    std::ifstream file(path, std::ios::binary);
-    std::ostringstream content;
-    if (!file || !(content << file.rdbuf())) {
-        error = std::string("cannot read it: ") + std::strerror(errno);
-        return false;
-    }
-    bytes = content.str();
-    return true;
-}
 
 /// The text from `at` to the next zero byte, at most `limit` long; false
 /// when no zero byte comes in time.
@@ -79,64 +53,45 @@ bool parseSize(const std::string& digits, std::size_t& size) {
     return true;
 }
 
-std::string attribute(const XmlElement& element, const char* name) {
-    auto found = element.attributes.find(name);
-    return found == element.attributes.end() ? "" : found->second;
-}
-
 /// "prop_list" of "prop_string" reads "list of string".
-std::string typeText(const XmlElement& parameter) {
+std::string typeText(const ParameterInfo& parameter) {
     auto plain = [](std::string type) {
         return type.rfind("prop_", 0) == 0 ? type.substr(5) : type;
     };
-    std::string type = plain(attribute(parameter, "type"));
-    std::string listType = attribute(parameter, "listType");
-    return listType.empty() ? type : type + " of " + plain(listType);
+    std::string type = plain(parameter.type);
+    return parameter.listType.empty() ? type : type + " of " + plain(parameter.listType);
 }
 
-std::string accessText(const XmlElement& memtype) {
-    if (attribute(memtype, "isReadOnly") == "true") {
-        return "read-only";
+std::string choicesText(const std::vector<std::string>& choices) {
+    if (choices.empty()) {
+        return "";
     }
-    return attribute(memtype, "isWriteOnly") == "true" ? "write-only" : "read/write";
+    std::string text = choices.size() <= 4 ? "" : std::to_string(choices.size()) + " choices: ";
+    text += choices.front();
+    for (std::size_t i = 1; i < choices.size() && i < 4; ++i) {
+        text += ", " + choices[i];
+    }
+    return "  " + text + (choices.size() > 4 ? " ... " + choices.back() : "");
 }
 
-struct Parameter {
-    const XmlElement* element;
-    std::vector<std::string> choices;
-};
-
-void printParameters(const std::vector<Parameter>& parameters, std::ostream& out) {
+void printParameters(const std::vector<ParameterInfo>& parameters, std::ostream& out) {
     out << "\nParameters (" << parameters.size() << "):\n";
-    for (const Parameter& p : parameters) {
-        const XmlElement& e = *p.element;
-        std::string choices;
-        if (!p.choices.empty()) {
-            choices = p.choices.size() <= 4 ? "" : std::to_string(p.choices.size()) + " choices: ";
-            choices += p.choices.front();
-            for (std::size_t i = 1; i < p.choices.size() && i < 4; ++i) {
-                choices += ", " + p.choices[i];
-            }
-            choices += p.choices.size() > 4 ? " ... " + p.choices.back() : "";
-        }
-        std::string fallback = attribute(e, "default");
-        out << "  " << std::left << std::setw(18) << e.text << std::setw(18) << typeText(e)
-            << std::setw(16) << (fallback.empty() ? "-" : "default " + fallback)
-            << (attribute(e, "isMandatory") == "true" ? "mandatory" : "optional");
-        out << (choices.empty() ? "" : "  " + choices) << "\n";
-    }
-}
-
-void printMemoryTypes(const std::vector<const XmlElement*>& memtypes, std::ostream& out) {
-    out << "\nMemory types (" << memtypes.size() << "):\n";
-    for (const XmlElement* m : memtypes) {
-        out << "  " << std::left << std::setw(19) << m->text << std::setw(13)
-            << attribute(*m, "naturalType") << std::setw(12) << accessText(*m)
-            << attribute(*m, "display") << "\n";
+    for (const ParameterInfo& p : parameters) {
+        out << "  " << std::left << std::setw(18) << p.key << std::setw(18) << typeText(p)
+            << std::setw(16) << (p.defaultValue.empty() ? "-" : "default " + p.defaultValue)
+            << (p.mandatory ? "mandatory" : "optional") << choicesText(p.choices) << "\n";
     }
 }
 
 }  // namespace
+
+void printMemoryTypes(const std::vector<MemoryTypeInfo>& memoryTypes, std::ostream& out) {
+    out << "\nMemory types (" << memoryTypes.size() << "):\n";
+    for (const MemoryTypeInfo& m : memoryTypes) {
+        out << "  " << std::left << std::setw(19) << m.name << std::setw(13) << m.naturalType
+            << std::setw(12) << m.access << m.display << "\n";
+    }
+}
 
 bool findDescription(const std::string& file, DescriptionBlock& block, std::string& error) {
     std::size_t start = file.find(kStart);
@@ -204,38 +159,24 @@ bool inflateDescription(const std::string& compressed, std::string& xml, std::st
 
 bool summarizeDescription(const DescriptionBlock& block, const std::string& xml, std::ostream& out,
                           std::string& error) {
-    std::vector<XmlElement> elements;
-    if (!scanXml(xml, elements, error)) {
-        error = "the description is no XML document: " + error;
+    PluginDescription description;
+    if (!parseDescription(block, xml, description, error)) {
         return false;
     }
-    for (const auto& [key, value] : block.header) {
+    for (const auto& [key, value] : description.header) {
         out << std::left << std::setw(10) << key << " " << value << "\n";
     }
     out << "XML        " << xml.size() << " bytes (" << block.compressed.size() << " compressed)\n";
-    std::vector<Parameter> parameters;
-    std::vector<const XmlElement*> memtypes;
-    for (const XmlElement& e : elements) {
-        if (e.name == "parameter" && e.parent == "parameters") {
-            parameters.push_back({&e, {}});
-        } else if (e.name == "list_entry" && e.parent == "parameter" && !parameters.empty()) {
-            parameters.back().choices.push_back(e.text);
-        } else if (e.name == "memtype" && e.parent == "memtypes") {
-            memtypes.push_back(&e);
-        }
-    }
-    printParameters(parameters, out);
-    printMemoryTypes(memtypes, out);
+    printParameters(description.parameters, out);
+    printMemoryTypes(description.memoryTypes, out);
     return true;
 }
 
 int runDescribe(const std::string& path, bool wholeXml, std::ostream& out, std::ostream& err) {
-    std::string file;
     std::string error;
     DescriptionBlock block;
     std::string xml;
-    bool ok = readFile(path, file, error) && findDescription(file, block, error) &&
-              inflateDescription(block.compressed, xml, error);
+    bool ok = readDescriptionXml(path, block, xml, error);
     if (ok && wholeXml) {
         out << xml;
     } else if (ok) {

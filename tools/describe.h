@@ -10,6 +10,8 @@
 #include <utility>
 #include <vector>
 
+#include "tools/plugin_description.h"
+
 namespace xtok::tools {
 
 struct DescriptionBlock {
@@ -28,6 +30,9 @@ bool inflateDescription(const std::string& compressed, std::string& xml, std::st
 /// The header fields, then the parameters and memory types of the XML.
 bool summarizeDescription(const DescriptionBlock& block, const std::string& xml, std::ostream& out,
                           std::string& error);
+
+/// "Memory types (N):" and one line each: name, natural type, access, display.
+void printMemoryTypes(const std::vector<MemoryTypeInfo>& memoryTypes, std::ostream& out);
 
 /// The whole command; the exit status.
 int runDescribe(const std::string& path, bool wholeXml, std::ostream& out, std::ostream& err);

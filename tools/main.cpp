@@ -1,16 +1,20 @@
 // xtok-host: the xtokline plug-in on a PC, loaded exactly as a panel runtime
-// loads it. Subcommands: demo, run, describe, ports.
+// loads it. Subcommands: demo, run, describe, ports, completion.
 #include <CLI/CLI.hpp>
-#include <cstdlib>
+#include <algorithm>
 #include <cstring>
 #include <iostream>
 
+#include "tools/closest_word.h"
+#include "tools/completion.h"
 #include "tools/demo.h"
 #include "tools/describe.h"
+#include "tools/fault_report.h"
 #include "tools/interrupt.h"
 #include "tools/plugin_path.h"
 #include "tools/ports.h"
 #include "tools/run_command.h"
+#include "tools/version.h"
 #include "xtokline/text.h"
 
 namespace {
@@ -20,10 +24,10 @@ using namespace xtok::tools;
 constexpr int kUsageError = 2;
 
 /// CLI11 explains in several lines; a wrong argument deserves one.
-int usageError(const CLI::ParseError& e) {
+int usageError(const CLI::ParseError& e, bool json) {
     std::string what = e.what();
     std::replace(what.begin(), what.end(), '\n', ' ');
-    std::cerr << "xtok-host: " << what << " (xtok-host --help explains)" << std::endl;
+    reportFaults({what + " (xtok-host --help explains)"}, json, std::cout, std::cerr);
     return kUsageError;
 }
 
@@ -38,19 +42,68 @@ std::string positive(std::string& value) {
 
 /// CLI11 takes an unknown first word for a stray argument and asks for a
 /// subcommand; say what is wrong instead.
-bool knownCommand(int argc, char** argv) {
+bool knownCommand(const CLI::App& app, int argc, char** argv, bool json) {
     if (argc < 2 || argv[1][0] == '-') {
         return true;
     }
-    static const char* const kCommands[] = {"demo", "run", "describe", "ports"};
-    for (const char* name : kCommands) {
-        if (std::strcmp(argv[1], name) == 0) {
-            return true;
-        }
+    std::vector<std::string> names;
+    for (const CLI::App* command : app.get_subcommands([](const CLI::App*) { return true; })) {
+        names.push_back(command->get_name());
     }
-    std::cerr << "xtok-host: unknown command '" << argv[1]
-              << "'; the commands are demo, run, describe and ports" << std::endl;
+    if (std::find(names.begin(), names.end(), argv[1]) != names.end()) {
+        return true;
+    }
+    std::string all;
+    for (const std::string& name : names) {
+        all += (all.empty() ? "" : ", ") + name;
+    }
+    reportFaults({unknownWord("command", argv[1], names) + " (the commands: " + all + ")"}, json,
+                 std::cout, std::cerr);
     return false;
+}
+
+CLI::App* addDemo(CLI::App& app, DemoOptions& demo) {
+    CLI::App* command = app.add_subcommand(
+        "demo",
+        "A simulated reader on a pseudo-terminal, driven through the plug-in; no hardware "
+        "needed");
+    command->add_option("--count", demo.count, "Stop after this many codes (default: Ctrl-C)")
+        ->check(CLI::Validator(positive, "N"));
+    command->add_option("--interval", demo.intervalMs, "Milliseconds between the reader's codes")
+        ->check(CLI::Range(20, 60000))
+        ->capture_default_str();
+    command->add_option("--plugin", demo.pluginPath,
+                        "The plug-in file (default: beside xtok-host)");
+    return command;
+}
+
+CLI::App* addRun(CLI::App& app, RunOptions& run, const PluginDescription& description) {
+    CLI::App* command = app.add_subcommand(
+        "run",
+        "The plug-in on a serial line with a console: typed tag reads and writes, watch, "
+        "settings, and the plug-in's own commands. Without --config the editor's defaults "
+        "fill the line; options set single keys.");
+    command->footer(
+        "Console: tag read ADDRESS, tag write ADDRESS VALUE, watch [--count N] [--timeout S], "
+        "settings, help [datatypes|memorytypes], quit; any other line goes to the plug-in's own "
+        "console. Exit status 1 when any command failed.");
+    addLineOptions(*command, run.line, description);
+    command->add_option(
+        "--exec", run.exec,
+        "Commands separated by ';' (\\; for one inside a value) instead of standard input");
+    command->add_flag("--json", run.json, "One JSON object per result, one per line");
+    return command;
+}
+
+int startRun(const CLI::App& command, RunOptions& run, const PluginAtHand& plugin) {
+    if (!plugin.described) {
+        reportFaults({plugin.error}, run.json, std::cout, std::cerr);
+        return 1;
+    }
+    run.line.pluginPath = plugin.path;
+    SessionOptions session;
+    std::vector<std::string> faults = lineFaults(command, run.line, plugin.description, session);
+    return runConsole(run, session, plugin.description, faults, std::cout, std::cerr);
 }
 
 /// --plugin when given, else the plug-in beside this program.
@@ -63,53 +116,34 @@ bool pluginPath(std::string& path) {
     return false;
 }
 
+void addVersions(CLI::App& app, const PluginAtHand& plugin) {
+    auto text = [&plugin] {
+        return versionText(plugin.path, plugin.described ? &plugin.description : nullptr);
+    };
+    app.set_version_flag("--version", text);
+    for (CLI::App* command : app.get_subcommands([](CLI::App*) { return true; })) {
+        command->set_version_flag("--version", text);
+    }
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
+    const bool json = std::find_if(argv + 1, argv + argc, [](const char* a) {
+                          return std::strcmp(a, "--json") == 0;
+                      }) != argv + argc;
+    const PluginAtHand plugin = findPluginAtHand(argc, argv);
     CLI::App app{
         "xtok-host loads the xtokline serial token plug-in as an operator panel's runtime "
-        "does, on this PC's serial ports."};
+        "does, on this PC's serial ports.",
+        "xtok-host"};
     app.require_subcommand(1);
     app.footer("Exit status: 0 success, 1 a failure, 2 unusable arguments.");
 
     DemoOptions demo;
-    CLI::App* demoCommand =
-        app.add_subcommand("demo",
-                           "A simulated reader on a pseudo-terminal, driven through the plug-in; "
-                           "no hardware needed");
-    demoCommand->add_option("--count", demo.count, "Stop after this many codes (default: Ctrl-C)")
-        ->check(CLI::Validator(positive, "N"));
-    demoCommand
-        ->add_option("--interval", demo.intervalMs, "Milliseconds between the reader's codes")
-        ->check(CLI::Range(20, 60000))
-        ->capture_default_str();
-    demoCommand->add_option("--plugin", demo.pluginPath,
-                            "The plug-in file (default: beside xtok-host)");
-
+    CLI::App* demoCommand = addDemo(app, demo);
     RunOptions run;
-    CLI::App* runCommand = app.add_subcommand(
-        "run",
-        "The plug-in on a serial line with a console: typed tag reads and writes, "
-        "watch, settings, and the plug-in's own commands");
-    runCommand->footer(
-        "Console: tag read ADDRESS, tag write ADDRESS VALUE, watch [--count N] [--timeout S], "
-        "settings, help, quit; any other line goes to the plug-in's own console. help "
-        "explains the values. Exit status 1 when any command failed.");
-    runCommand->add_option("--config", run.config, "Configuration text, or @FILE holding it")
-        ->required();
-    runCommand->add_option("--map", run.maps,
-                           "Device of a port name, e.g. com1=/dev/ttyUSB0 (repeatable)");
-    runCommand->add_option("--state", run.statePath,
-                           "SQLite file for retained settings (default: "
-                           "$XDG_STATE_HOME/xtokline/retained.sqlite3)");
-    runCommand->add_option("--plugin", run.pluginPath,
-                           "The plug-in file (default: beside xtok-host)");
-    runCommand->add_option("--instance", run.instanceName,
-                           "Instance name, under which settings are retained (default: XTOK)");
-    runCommand->add_option(
-        "--exec", run.exec,
-        "Commands separated by ';' (\\; for one inside a value) instead of standard input");
-    runCommand->add_flag("--json", run.json, "One JSON object per result, one per line");
+    CLI::App* runCommand = addRun(app, run, plugin.description);
 
     std::string describePath;
     bool wholeXml = false;
@@ -119,20 +153,33 @@ int main(int argc, char** argv) {
                                 "The plug-in file (default: beside xtok-host)");
     describeCommand->add_flag("--xml", wholeXml, "Print the whole XML description");
 
+    bool portsJson = false;
     CLI::App* portsCommand = app.add_subcommand("ports", "The serial ports of this machine");
+    portsCommand->add_flag("--json", portsJson, "One JSON object with the ports");
 
-    if (!knownCommand(argc, argv)) {
+    CLI::App* completionCommand = app.add_subcommand(
+        "completion", "A completion script: source <(xtok-host completion bash)");
+    completionCommand->add_option("shell", "The shell; bash is the one there is")
+        ->required()
+        ->check(CLI::IsMember({"bash"}));
+    addVersions(app, plugin);
+
+    if (!knownCommand(app, argc, argv, json)) {
         return kUsageError;
     }
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& e) {
-        return e.get_exit_code() == 0 ? app.exit(e) : usageError(e);
+        return e.get_exit_code() == 0 ? app.exit(e) : usageError(e, json);
     }
 
     catchInterrupts();
+    if (*completionCommand) {
+        std::cout << bashCompletion(app);
+        return 0;
+    }
     if (*portsCommand) {
-        return runPorts(std::cout, std::cerr);
+        return runPorts(portsJson, std::cout, std::cerr);
     }
     if (*describeCommand) {
         return pluginPath(describePath) ? runDescribe(describePath, wholeXml, std::cout, std::cerr)
@@ -141,5 +188,5 @@ int main(int argc, char** argv) {
     if (*demoCommand) {
         return pluginPath(demo.pluginPath) ? runDemo(demo, std::cout, std::cerr) : 1;
     }
-    return pluginPath(run.pluginPath) ? runConsole(run, std::cout, std::cerr) : 1;
+    return startRun(*runCommand, run, plugin);
 }

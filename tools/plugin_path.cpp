@@ -2,6 +2,7 @@
 
 #include <unistd.h>
 
+#include <cstring>
 #include <filesystem>
 #include <vector>
 
@@ -32,6 +33,31 @@ bool findDefaultPlugin(std::string& path, std::string& error) {
     }
     error = "no plug-in beside xtok-host (looked for " + looked + "); give --plugin PATH";
     return false;
+}
+
+namespace {
+
+/// The value of `--name VALUE` or `--name=VALUE`, "" without one.
+std::string valueOf(int argc, char** argv, const std::string& name) {
+    for (int i = 1; i < argc; ++i) {
+        if (argv[i] == name && i + 1 < argc) {
+            return argv[i + 1];
+        }
+        if (std::strncmp(argv[i], (name + "=").c_str(), name.size() + 1) == 0) {
+            return argv[i] + name.size() + 1;
+        }
+    }
+    return "";
+}
+
+}  // namespace
+
+PluginAtHand findPluginAtHand(int argc, char** argv) {
+    PluginAtHand plugin;
+    plugin.path = valueOf(argc, argv, "--plugin");
+    plugin.described = (!plugin.path.empty() || findDefaultPlugin(plugin.path, plugin.error)) &&
+                       readDescription(plugin.path, plugin.description, plugin.error);
+    return plugin;
 }
 
 }  // namespace xtok::tools

@@ -125,6 +125,10 @@ std::unique_ptr<PluginSession> PluginSession::start(const SessionOptions& option
         return nullptr;
     }
     session->relay_->passOn();
+    session->settings_.configured(options.config);
+    if (host::PermanentStorage* storage = session->host_->permanentStorage()) {
+        session->settings_.retainedAtStart(*storage, protocol.GetInstanceName());
+    }
     return session;
 }
 
@@ -244,7 +248,10 @@ bool PluginSession::write(const std::string& address, const std::string& text, s
         [&] { written = protocol_->WriteTag(found, bytes.empty() ? &none : bytes.data()); });
     if (!written) {
         error = "cannot write " + address + ": " + reasonSince(before);
-    } else if (!kept.empty()) {
+    } else {
+        trackWrite(address, kept.empty());
+    }
+    if (written && !kept.empty()) {
         error = address + " written, but its " + kept;
     }
     return written && kept.empty();
@@ -256,11 +263,14 @@ std::string PluginSession::command(const std::string& line, bool& ok) {
     const std::string kept = retaining(
         [&] { known = protocol_->DoCommand(line.c_str(), buffer.data(), kReplySize - 1); });
     std::string reply(buffer.data());
+    std::string word = line.substr(0, line.find(' '));
+    if (known && !replyTellsFailure(word, reply)) {
+        trackCommand(line, kept.empty());
+    }
     if (!kept.empty()) {
         ok = false;
         return reply.empty() ? kept : reply + " (but " + kept + ")";
     }
-    std::string word = line.substr(0, line.find(' '));
     if (!known && reply.empty()) {
         ok = false;
         return "unknown command '" + word + "' (help lists them)";

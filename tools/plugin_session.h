@@ -11,6 +11,7 @@
 
 #include "host/plugin_loader.h"
 #include "host/service_provider.h"
+#include "tools/settings_model.h"
 #include "tools/tag_values.h"
 
 namespace xtok::tools {
@@ -69,6 +70,9 @@ public:
     /// Takes the oldest received token off the queue, if there is one.
     Intake takeToken(Token& token, std::string& error);
 
+    /// The settings as this session has changed them (settings_tracking.cpp).
+    const SettingsModel& settings() const { return settings_; }
+
 private:
     PluginSession() = default;
     bool load(const SessionOptions& options, std::string& error);
@@ -86,6 +90,11 @@ private:
     /// (or nothing is stored), else why they are not.
     template <class Call>
     std::string retaining(Call call);
+    /// Follows a successful write of `address` in the settings model; `kept`
+    /// tells whether what it retains is in the state file.
+    void trackWrite(const std::string& address, bool kept);
+    /// The same for a console line the plug-in carried out.
+    void trackCommand(const std::string& line, bool kept);
 
     struct TagDeleter {
         void operator()(ITag* tag) const;
@@ -97,6 +106,7 @@ private:
     std::unique_ptr<host::LoadedPlugin> plugin_;
     IProtocol7* protocol_ = nullptr;
     std::map<std::string, std::unique_ptr<ITag, TagDeleter>> tags_;
+    SettingsModel settings_;
 };
 
 }  // namespace xtok::tools

@@ -7,6 +7,9 @@
 #include <ostream>
 #include <string>
 
+#include "tools/fault_report.h"
+#include "tools/json_line.h"
+
 namespace xtok::tools {
 
 namespace {
@@ -31,22 +34,35 @@ std::string transportOf(sp_port* port) {
 
 }  // namespace
 
-int runPorts(std::ostream& out, std::ostream& err) {
+int runPorts(bool json, std::ostream& out, std::ostream& err) {
     sp_port** ports = nullptr;
     if (sp_list_ports(&ports) != SP_OK) {
         char* why = sp_last_error_message();
-        err << "xtok-host: cannot list the serial ports: " << (why ? why : "unknown error")
-            << std::endl;
+        reportFaults(
+            {std::string("cannot list the serial ports: ") + (why ? why : "unknown error")}, json,
+            out, err);
         sp_free_error_message(why);
         return 1;
     }
+    std::string list;
     int count = 0;
     for (sp_port** port = ports; *port; ++port, ++count) {
         const char* description = sp_get_port_description(*port);
-        out << std::left << std::setw(20) << sp_get_port_name(*port) << std::setw(16)
-            << transportOf(*port) << (description ? description : "") << "\n";
+        list += (list.empty() ? "" : ",") + JsonLine()
+                                                .text("name", sp_get_port_name(*port))
+                                                .text("transport", transportOf(*port))
+                                                .text("description", description ? description : "")
+                                                .str();
+        if (!json) {
+            out << std::left << std::setw(20) << sp_get_port_name(*port) << std::setw(16)
+                << transportOf(*port) << (description ? description : "") << "\n";
+        }
     }
     sp_free_port_list(ports);
+    if (json) {
+        out << JsonLine().flag("ok", true).raw("ports", "[" + list + "]").str() << std::endl;
+        return 0;
+    }
     if (count == 0) {
         out << "no serial ports found\n";
     }

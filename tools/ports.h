@@ -5,7 +5,8 @@
 
 namespace xtok::tools {
 
-/// The exit status.
-int runPorts(std::ostream& out, std::ostream& err);
+/// The exit status. With `json`, one result: {"ok":true,"ports":[{"name":
+/// "/dev/ttyUSB0","transport":"usb 0403:6001","description":"..."},...]}.
+int runPorts(bool json, std::ostream& out, std::ostream& err);
 
 }  // namespace xtok::tools

@@ -2,15 +2,13 @@
 
 #include <unistd.h>
 
-#include <cerrno>
-#include <cstring>
-#include <fstream>
 #include <ostream>
-#include <sstream>
 
+#include "host/permanent_storage.h"
+#include "tools/config_text.h"
 #include "tools/console_session.h"
+#include "tools/fault_report.h"
 #include "tools/line_input.h"
-#include "tools/plugin_session.h"
 
 namespace xtok::tools {
 
@@ -18,53 +16,42 @@ namespace {
 
 constexpr int kUsageError = 2;
 
-bool configText(const std::string& option, std::string& text, std::string& error) {
-    if (option.empty() || option[0] != '@') {
-        text = option;
-        return true;
-    }
-    std::string path = option.substr(1);
-    std::ifstream file(path, std::ios::binary);
-    std::ostringstream content;
-    if (!file || !(content << file.rdbuf())) {
-        error = "cannot read the configuration file " + path + ": " + std::strerror(errno);
-        return false;
-    }
-    text = content.str();
-    return true;
+/// Which device, plug-in and state file this console works with.
+void banner(PluginSession& started, const SessionOptions& session, std::ostream& out) {
+    char line[256] = {};
+    started.protocol().GetSerialSettings(line, sizeof line - 1);
+    const std::string* port = ConfigText(session.config).find(kPortKey);
+    std::string device;
+    std::string unused;
+    session.ports.resolve(port ? *port : "", device, unused);
+    out << "xtok-host: " << started.protocol().GetDisplayName() << " on " << device << " (" << line
+        << ")\n  plug-in " << session.pluginPath << "\n  state   "
+        << (session.statePath.empty() ? host::defaultStoragePath() : session.statePath)
+        << "\nhelp lists the commands, quit leaves" << std::endl;
 }
 
 }  // namespace
 
-int runConsole(const RunOptions& options, std::ostream& out, std::ostream& err) {
-    SessionOptions session;
-    std::string error;
-    session.pluginPath = options.pluginPath;
-    session.statePath = options.statePath;
-    session.instanceName = options.instanceName;
-    bool usable = configText(options.config, session.config, error);
-    for (const std::string& map : options.maps) {
-        usable = usable && session.ports.assign(map, error);
-    }
-    if (!usable) {
-        err << "xtok-host: " << error << std::endl;
+int runConsole(const RunOptions& options, const SessionOptions& session,
+               const PluginDescription& description, const std::vector<std::string>& faults,
+               std::ostream& out, std::ostream& err) {
+    if (!faults.empty()) {
+        reportFaults(faults, options.json, out, err);
         return kUsageError;
     }
+    std::string error;
     std::unique_ptr<PluginSession> started = PluginSession::start(session, error);
     if (!started) {
-        err << "xtok-host: " << error << std::endl;
+        reportFaults({error}, options.json, out, err);
         return 1;
     }
     bool typed = options.exec.empty() && isatty(STDIN_FILENO);
     std::unique_ptr<LineInput> input =
         options.exec.empty() ? LineInput::fromStdin("xtok> ") : LineInput::fromText(options.exec);
     if (typed && !options.json) {
-        char line[256] = {};
-        started->protocol().GetSerialSettings(line, sizeof line - 1);
-        out << "xtok-host: " << started->protocol().GetDisplayName() << " on " << line
-            << "; help lists the commands, quit leaves" << std::endl;
+        banner(*started, session, out);
     }
-    ConsoleSession console(*started, options.json, out, err);
+    ConsoleSession console(*started, description, options.json, out, err);
     return console.run(*input) ? 0 : 1;
 }
 

@@ -5,20 +5,21 @@
 #include <string>
 #include <vector>
 
+#include "tools/line_options.h"
+
 namespace xtok::tools {
 
 struct RunOptions {
-    std::string config;             // the text, or "@" and a file holding it
-    std::vector<std::string> maps;  // "com1=/dev/ttyUSB0"
-    std::string statePath;
-    std::string pluginPath;
-    std::string instanceName;
+    LineOptions line;
     std::string exec;  // "cmd; cmd" instead of standard input
     bool json = false;
 };
 
-/// Exit status: 0 when every command succeeded, 1 when one failed or the
-/// session could not start, 2 for unusable arguments.
-int runConsole(const RunOptions& options, std::ostream& out, std::ostream& err);
+/// Starts `session` unless there are `faults` (lineFaults'), then runs the
+/// console. Exit status: 0 when every command succeeded, 1 when one failed
+/// or the session could not start, 2 for faults in the arguments.
+int runConsole(const RunOptions& options, const SessionOptions& session,
+               const PluginDescription& description, const std::vector<std::string>& faults,
+               std::ostream& out, std::ostream& err);
 
 }  // namespace xtok::tools

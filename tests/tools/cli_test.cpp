@@ -170,20 +170,111 @@ TEST_F(Session, CtrlCEndsAWatchAndTheScriptGoesOn) {
 TEST_F(Session, JsonGivesOneObjectPerResult) {
     Finished done = runTool(run({"--json", "--exec",
                                  "tag write 0?tx_token?string-16 \"A\\x01\"; watch --count 1 "
-                                 "--timeout 10; settings; tag read 0?nope?int"}));
+                                 "--timeout 10; settings; tag read 0?nope?int; help datatypes; "
+                                 "help memorytypes"}));
     EXPECT_EQ(done.status, 1);
     std::vector<std::string> lines = linesOf(done.out);
-    ASSERT_EQ(lines.size(), 5u) << done.out;
+    ASSERT_EQ(lines.size(), 7u) << done.out;
     for (const std::string& line : lines) {
         EXPECT_TRUE(line.front() == '{' && line.back() == '}') << line;
     }
     EXPECT_NE(lines[1].find("\"token\":\"ACK A\\u0001\",\"length\":6"), std::string::npos)
         << lines[1];
     EXPECT_NE(lines[2].find("\"ok\":true,\"tokens\":1"), std::string::npos) << lines[2];
-    EXPECT_NE(lines[3].find("\"SP_Baud\":9600"), std::string::npos) << lines[3];
+    EXPECT_NE(lines[3].find("\"SP_Baud\":{\"key\":\"baudrate\",\"active\":9600"), std::string::npos)
+        << lines[3];
     EXPECT_NE(lines[4].find("\"ok\":false,\"error\":\"bad tag address"), std::string::npos)
         << lines[4];
+    EXPECT_NE(lines[5].find("\"datatypes\":[\"boolean\",\"byte\""), std::string::npos);
+    EXPECT_NE(lines[5].find("\"string-N\",\"binary-N\",\"time\""), std::string::npos);
+    EXPECT_NE(lines[6].find("{\"name\":\"SP_Done\",\"type\":\"boolean\""), std::string::npos);
     EXPECT_EQ(done.err, "");
+}
+
+// Each option of the short form sets what its key in a configuration text
+// sets; without options the editor's defaults make the line.
+TEST_F(Session, EachOptionSetsWhatItsKeyDoes) {
+    const std::pair<std::vector<std::string>, std::string> kOptions[] = {
+        {{"--baud", "19200"}, "baudrate=19200"},
+        {{"--baudrate", "4800"}, "baudrate=4800"},
+        {{"--stop", "2"}, "stopbits=2"},
+        {{"--stopbits", "2"}, "stopbits=2"},
+        {{"--mode", "RS-422"}, "mode=RS-422"},
+        {{"--prefix", "02"}, "rx_prefix=02"},
+        {{"--rx-prefix", "1B"}, "rx_prefix=1B"},
+        {{"--suffix", "0d0a"}, "rx_suffix=0d0a"},
+        {{"--rx-suffix", "03"}, "rx_suffix=03"},
+        {{"--tx-prefix", "02"}, "tx_prefix=02"},
+        {{"--tx-suffix", "03"}, "tx_suffix=03"},
+        {{"--gap", "40"}, "gap=40"},
+        {{"--hex-tokens"}, "hex_tokens=true"},
+        {{"--queue-size", "7"}, "token_queue_size=7"},
+        {{"--token-queue-size", "9"}, "token_queue_size=9"},
+        {{"--no-auto-connect"}, "autoConnect=false"},
+    };
+    auto settingsWith = [&](std::vector<std::string> how) {
+        how.insert(how.begin(), {kHost, "run", "--plugin", kPlugin, "--state",
+                                 dir_.file("retained.sqlite3"), "--exec", "settings; get_stat"});
+        return runTool(how).out;
+    };
+    const std::string device = line_->slavePath();
+    // The line with `key` in place of its default.
+    auto text = [&device](const std::string& key) {
+        std::string text = "CfgVer=1 model=1 port=" + device + " " + key;
+        for (std::string entry :
+             {"baudrate=9600", "parity=none", "bits=8", "stopbits=1", "mode=RS-232"}) {
+            text += key.rfind(entry.substr(0, entry.find('=') + 1), 0) == 0 ? "" : " " + entry;
+        }
+        return text;
+    };
+    const std::string defaults = settingsWith({device, "--parity", "none"});
+    EXPECT_EQ(settingsWith({"--config", text("")}), defaults);
+    for (auto [option, key] : kOptions) {
+        option.insert(option.end(), {device, "--parity", "none"});
+        const std::string byOption = settingsWith(option);
+        EXPECT_EQ(byOption, settingsWith({"--config", text(key)})) << key;
+        EXPECT_NE(byOption, defaults) << key;
+    }
+}
+
+// The console's setters and the SP_ writes pass through xtok-host, which
+// follows them; what it says is active is what the plug-in then receives by.
+TEST_F(Session, SettingsTellWhereEachActiveValueCameFrom) {
+    std::string error;
+    auto storage = host::PermanentStorage::open(dir_.file("retained.sqlite3"), error);
+    ASSERT_TRUE(storage && storage->WriteInt("XTOK", "gap", 70)) << error;
+    storage.reset();
+    Finished done =
+        runTool(run({"--json", "--exec",
+                     "set_rxPrefix 05; tag write 0?SP_TokenQueueSize?unsignedInt 50; "
+                     "settings; tag write 0?SP_Done?boolean 1; settings; "
+                     "tag write 0?tx_token?string-8 HI; watch --count 1 --timeout 10"}));
+    std::vector<std::string> lines = linesOf(done.out);
+    ASSERT_EQ(lines.size(), 8u) << done.out << done.err;
+    auto setting = [](const char* type, const std::string& rest) {
+        return std::string("\"") + type + "\":{\"key\":" + rest;
+    };
+    const std::pair<std::string, std::string> kSeen[] = {
+        {lines[2], setting("SP_Baud", "\"baudrate\",\"active\":9600,\"source\":\"configuration\"")},
+        {lines[2], setting("SP_Gap",
+                           "\"gap\",\"active\":70,\"source\":\"retained file\","
+                           "\"staged\":null,\"retained\":70}")},
+        {lines[2],
+         setting("SP_RxPrefix", "\"rx_prefix\",\"active\":\"05\",\"source\":\"console\"")},
+        {lines[2], setting("SP_TokenQueueSize",
+                           "\"token_queue_size\",\"active\":100,"
+                           "\"source\":\"default\",\"staged\":50,\"retained\":null}")},
+        {lines[4], setting("SP_TokenQueueSize",
+                           "\"token_queue_size\",\"active\":50,"
+                           "\"source\":\"SP_ write\",\"staged\":50,\"retained\":50}")},
+        // SP_Done returns a console change to the starting value.
+        {lines[4],
+         setting("SP_RxPrefix", "\"rx_prefix\",\"active\":\"02\",\"source\":\"configuration\"")},
+        {lines[6], "\"token\":\"ACK HI\""},
+    };
+    for (const auto& [line, part] : kSeen) {
+        EXPECT_NE(line.find(part), std::string::npos) << part << "\n" << line;
+    }
 }
 
 TEST_F(Session, AScriptOnStandardInputGoesOnAfterAFailureAndSaysSoAtTheEnd) {
@@ -223,6 +314,66 @@ TEST(Cli, PortsListsWhatThereIsAndSaysWhatItCannot) {
     EXPECT_NE(done.out.find("Pseudo-terminals (/dev/pts/N) are not listed"), std::string::npos);
 }
 
+TEST(Cli, EveryCommandTellsItsVersionAndThePluginsOwn) {
+    for (const char* command : {"demo", "run", "describe", "ports", "completion"}) {
+        Finished done = runTool({kHost, command, "--version"});
+        EXPECT_EQ(done.status, 0) << command;
+        EXPECT_EQ(done.out, "xtok-host " XTOK_VERSION "\nplug-in XTOK (Xtokline) version 106: " +
+                                kPlugin + "\n");
+    }
+}
+
+TEST(Cli, UnderJsonEveryResultIsOneObjectOnStandardOutput) {
+    const std::vector<std::string> kFailures[] = {
+        {"bogus", "--json"},
+        {"ports", "--json", "--all"},
+        {"run", "--json", "--baudrat=1"},
+        {"run", "--json", "--plugin", kPlugin, "/dev/null/tty", "--parity", "none"},
+    };
+    for (std::vector<std::string> arguments : kFailures) {
+        arguments.insert(arguments.begin(), kHost);
+        Finished done = runTool(arguments);
+        EXPECT_NE(done.status, 0) << arguments[1];
+        EXPECT_EQ(done.err, "") << arguments[1];
+        EXPECT_EQ(done.out.rfind("{\"ok\":false,\"error\":\"", 0), 0u) << done.out;
+        EXPECT_EQ(linesOf(done.out).size(), 1u) << done.out;
+    }
+    Finished ports = runTool({kHost, "ports", "--json"});
+    EXPECT_EQ(ports.status, 0);
+    EXPECT_EQ(ports.out.rfind("{\"ok\":true,\"ports\":[", 0), 0u) << ports.out;
+}
+
+TEST(Cli, EveryConfigurationFaultIsToldAtOnceBeforeThePluginStarts) {
+    Finished done = runTool({kHost, "run", "--plugin", kPlugin, "--config",
+                             "CfgVer=1 model=1 port=/dev/null baudrat=9600 parity=EVEN", "--bits",
+                             "9", "--suffix", "0d0", "--queue-size", "0"});
+    EXPECT_EQ(done.status, 2);
+    EXPECT_EQ(linesOf(done.err),
+              (std::vector<std::string>{
+                  "xtok-host: unknown key 'baudrat'; did you mean 'baudrate'?",
+                  "xtok-host: parity 'EVEN' is not one of none, even, odd",
+                  "xtok-host: bits '9' is not one of 7, 8",
+                  "xtok-host: rx_suffix '0d0' is not hex: pairs of 0-9 and A-F, or none",
+                  "xtok-host: token_queue_size '0' is out of range 1 to 10000",
+                  "xtok-host: missing mandatory key 'baudrate'",
+                  "xtok-host: missing mandatory key 'stopbits'",
+                  "xtok-host: missing mandatory key 'mode'"}));
+}
+
+TEST(Cli, TheCompletionScriptOffersTheCommandsAndTheirOptions) {
+    auto offered = [](const std::string& words) {
+        return runTool({"/bin/bash", "-c",
+                        "source <(" + kHost + " completion bash) && COMP_WORDS=(" + words +
+                            ") && COMP_CWORD=$((${#COMP_WORDS[@]} - 1)) && _xtok_host && "
+                            "echo ${COMPREPLY[*]}"})
+            .out;
+    };
+    EXPECT_EQ(offered("xtok-host com"), "completion\n");
+    EXPECT_EQ(offered("xtok-host run --qu"), "--queue-size\n");
+    EXPECT_EQ(offered("xtok-host run --no"), "--no-auto-connect\n");
+    EXPECT_EQ(offered("xtok-host ports --"), "--help --json --version\n");
+}
+
 // Every bad input: one line on standard error, its reason, the right status.
 // In the arguments, {line} is a free pseudo-terminal, {busy} one that another
 // program holds, {locked} a file the user may not open, {dir} a scratch
@@ -240,20 +391,33 @@ const std::string kNoPort =
 
 const BadInput kBadInputs[] = {
     {"missing device", {"run", "--config", kNoPort + " port={dir}/ttyNONE"}, "No such file", 1},
-    {"unknown port name", {"run", "--config", kNoPort + " port=com17"}, "unknown port name", 1},
+    {"unknown port name", {"run", "--config", kNoPort + " port=com17"}, "unknown port name", 2},
     {"busy port", {"run", "--config", kNoPort + " port={busy}"}, "in use by another program", 1},
     {"no permission",
      {"run", "--config", kNoPort + " port={locked}"},
      "Permission denied",
      1,
      true},
-    {"no port in the configuration", {"run", "--config", kNoPort}, "'port' is not found", 1},
+    {"no port in the configuration",
+     {"run", "--config", kNoPort},
+     "missing mandatory key 'port'",
+     2},
+    {"no device", {"run"}, "name the device", 2},
     {"bad parity",
      {"run", "--config",
       "CfgVer=1 model=1 port={line} baudrate=9600 parity=EVEN bits=8 stopbits=1 mode=RS-232"},
-     "'parity' has invalid value",
-     1},
-    {"no configuration at all", {"run", "--config", "hello"}, "unknown format", 1},
+     "parity 'EVEN' is not one of none, even, odd",
+     2},
+    {"misspelled key",
+     {"run", "--config", kNoPort + " port={line} baudrat=9600"},
+     "unknown key 'baudrat'; did you mean 'baudrate'?",
+     2},
+    {"misspelled option",
+     {"run", "{line}", "--baudrat", "9600"},
+     "unknown option '--baudrat'; did you mean '--baudrate'?",
+     2},
+    {"blank in a value", {"run", "{line}", "--prefix", "02 gap=9"}, "cannot be written", 2},
+    {"no configuration at all", {"run", "--config", "hello"}, "unknown format", 2},
     {"bad tag address",
      {"run", "--config", kNoPort + " port={line}", "--exec", "tag read 0?x?int"},
      "bad tag address '0?x?int'",
@@ -263,22 +427,19 @@ const BadInput kBadInputs[] = {
       "tag write 0?SP_Baud?unsignedInt fast"},
      "'fast' is not a number",
      1},
-    {"text as plug-in",
-     {"run", "--plugin", "{text}", "--config", kNoPort + " port={line}"},
-     "is not a shared object",
-     1},
+    {"text as plug-in", {"run", "--plugin", "{text}", "{line}"}, "no description block", 1},
     {"text described", {"describe", "{text}"}, "no description block", 1},
     {"missing plug-in", {"describe", "{dir}/none.so"}, "No such file", 1},
     {"unknown command", {"bogus"}, "unknown command 'bogus'", 2},
     {"unknown option", {"demo", "--colour"}, "--colour", 2},
-    {"no configuration option", {"run"}, "--config is required", 2},
     {"count of zero", {"demo", "--count", "0"}, "whole number above 0", 2},
     {"watch count of zero",
      {"run", "--config", kNoPort + " port={line}", "--exec", "watch --count 0"},
      "--count",
      1},
-    {"bad port map", {"run", "--config", kNoPort, "--map", "com99=/dev/x"}, "comN=DEVICE", 2},
+    {"bad port map", {"run", "{line}", "--map", "com99=/dev/x"}, "comN=DEVICE", 2},
     {"configuration file missing", {"run", "--config", "@{dir}/none.cfg"}, "cannot read", 2},
+    {"endless configuration file", {"run", "--config", "@/dev/zero"}, "larger than 1 MiB", 2},
 };
 
 class BadInputs : public ::testing::Test {
