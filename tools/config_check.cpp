@@ -46,6 +46,16 @@ bool amongChoices(const ParameterInfo& p, const std::vector<std::string>& choice
     return false;
 }
 
+/// Values the editor does not offer that the plug-in still takes: any baud
+/// rate, bits or stop bits the host's line check lets pass, and the names of
+/// the parity and mode codes the line knows ("mark").
+bool takenBeyondTheList(const ParameterInfo& p, const Setting* setting, const std::string& value) {
+    int32_t number = 0;
+    return p.listType == "prop_integer" ? wholeNumber(value, number)
+                                        : setting && setting->spelledAs != SpelledAs::Number &&
+                                              configuredNumber(*setting, value, number);
+}
+
 /// The bounds of a number: the editor's, else the settings table's.
 bool withinBounds(const ParameterInfo& p, int32_t number, std::string& bounds) {
     int32_t low = INT32_MIN;
@@ -74,7 +84,8 @@ std::string valueFault(const ParameterInfo& p, const std::string& value,
         p.type == "prop_modelRef" ? description.models : p.choices;
     int32_t number = 0;
     const Setting* setting = findSettingByConfigKey(p.key);
-    if (!choices.empty() && !amongChoices(p, choices, value)) {
+    if (!choices.empty() && !amongChoices(p, choices, value) &&
+        !takenBeyondTheList(p, setting, value)) {
         return quoted(p.key, value) + " is not one of " + listed(choices);
     }
     if (p.type == "prop_integer" && !wholeNumber(value, number)) {
@@ -141,14 +152,18 @@ struct Checker {
     }
 
     // The line as Configure decodes it, checked as the host checks a line
-    // before it applies it; only when each of its keys passed its own checks.
+    // before it applies it; a key that failed its own checks, or is missing,
+    // counts with the editor's default, so that the others are still told.
     void line(const ConfigText& config) {
         int32_t values[kSettingCount] = {};
         for (const Setting& setting : kSettings) {
             const std::string* text = config.find(setting.configKey);
+            const ParameterInfo* p = description.parameter(setting.configKey);
+            const std::string value = text && !faulty.count(setting.configKey) ? *text
+                                      : p                                      ? p->defaultValue
+                                                                               : "";
             if (setting.activation == Activation::PortReconfigure &&
-                (faulty.count(setting.configKey) || !text ||
-                 !configuredNumber(setting, *text, values[setting.id]))) {
+                !configuredNumber(setting, value, values[setting.id])) {
                 return;
             }
         }

@@ -352,12 +352,12 @@ TEST(Cli, EveryConfigurationFaultIsToldAtOnceBeforeThePluginStarts) {
               (std::vector<std::string>{
                   "xtok-host: unknown key 'baudrat'; did you mean 'baudrate'?",
                   "xtok-host: parity 'EVEN' is not one of none, even, odd",
-                  "xtok-host: bits '9' is not one of 7, 8",
                   "xtok-host: rx_suffix '0d0' is not hex: pairs of 0-9 and A-F, or none",
                   "xtok-host: token_queue_size '0' is out of range 1 to 10000",
                   "xtok-host: missing mandatory key 'baudrate'",
                   "xtok-host: missing mandatory key 'stopbits'",
-                  "xtok-host: missing mandatory key 'mode'"}));
+                  "xtok-host: missing mandatory key 'mode'",
+                  "xtok-host: the host cannot set this line: 9 data bits are not valid"}));
 }
 
 TEST(Cli, TheCompletionScriptOffersTheCommandsAndTheirOptions) {
