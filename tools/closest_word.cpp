@@ -46,6 +46,15 @@ std::string closestWord(const std::string& word, const std::vector<std::string>&
             bestDistance = distance;
         }
     }
+    // A word that begins or ends a key names it well enough: "baud" for
+    // "baudrate", "suffix" for "rx_suffix" (the first such key).
+    for (std::size_t i = 0; i < candidates.size() && best.empty() && word.size() >= 3; ++i) {
+        const std::string& c = candidates[i];
+        const bool part =
+            c.size() > word.size() && (c.compare(0, word.size(), word) == 0 ||
+                                       c.compare(c.size() - word.size(), word.size(), word) == 0);
+        best = part ? c : "";
+    }
     return best;
 }
 

@@ -412,6 +412,7 @@ const BadInput kBadInputs[] = {
      {"run", "--config", kNoPort + " port={line} baudrat=9600"},
      "unknown key 'baudrat'; did you mean 'baudrate'?",
      2},
+    {"part of a key", {"run", "--config", kNoPort + " port={line} suffix=03"}, "'rx_suffix'?", 2},
     {"misspelled option",
      {"run", "{line}", "--baudrat", "9600"},
      "unknown option '--baudrat'; did you mean '--baudrate'?",
