@@ -2,12 +2,9 @@
 
 #include <unistd.h>
 
-#include <cerrno>
-#include <cstring>
-#include <fstream>
 #include <ostream>
-#include <sstream>
 
+#include "tools/config_file.h"
 #include "tools/console_session.h"
 #include "tools/line_input.h"
 #include "tools/plugin_session.h"
@@ -23,15 +20,7 @@ bool configText(const std::string& option, std::string& text, std::string& error
         text = option;
         return true;
     }
-    std::string path = option.substr(1);
-    std::ifstream file(path, std::ios::binary);
-    std::ostringstream content;
-    if (!file || !(content << file.rdbuf())) {
-        error = "cannot read the configuration file " + path + ": " + std::strerror(errno);
-        return false;
-    }
-    text = content.str();
-    return true;
+    return readConfigFile(option.substr(1), text, error);
 }
 
 }  // namespace

@@ -226,7 +226,8 @@ TEST(Cli, PortsListsWhatThereIsAndSaysWhatItCannot) {
 // Every bad input: one line on standard error, its reason, the right status.
 // In the arguments, {line} is a free pseudo-terminal, {busy} one that another
 // program holds, {locked} a file the user may not open, {dir} a scratch
-// directory, {text} a file that is no plug-in.
+// directory (with big.cfg, a file past 1 MiB; zero.cfg, one with a zero
+// byte; fifo, a FIFO), {text} a file that is no plug-in.
 struct BadInput {
     const char* what;
     std::vector<std::string> arguments;
@@ -279,6 +280,11 @@ const BadInput kBadInputs[] = {
      1},
     {"bad port map", {"run", "--config", kNoPort, "--map", "com99=/dev/x"}, "comN=DEVICE", 2},
     {"configuration file missing", {"run", "--config", "@{dir}/none.cfg"}, "cannot read", 2},
+    {"configuration file too large", {"run", "--config", "@{dir}/big.cfg"}, "at most 1 MiB", 2},
+    {"configuration file with a zero byte", {"run", "--config", "@{dir}/zero.cfg"}, "zero byte", 2},
+    {"configuration FIFO", {"run", "--config", "@{dir}/fifo"}, "is a FIFO", 2},
+    {"configuration directory", {"run", "--config", "@{dir}"}, "is a directory", 2},
+    {"configuration device", {"run", "--config", "@/dev/zero"}, "is a device", 2},
 };
 
 class BadInputs : public ::testing::Test {
@@ -292,6 +298,9 @@ protected:
         ASSERT_EQ(flock(holder_, LOCK_EX | LOCK_NB), 0);
         std::ofstream(dir_.file("notes.txt")) << "not a plug-in\n";
         std::ofstream(dir_.file("locked")) << "";
+        std::ofstream(dir_.file("big.cfg")) << std::string((1 << 20) + 1, ' ');
+        std::ofstream(dir_.file("zero.cfg")) << kNoPort + std::string(1, '\0') + " port=com1";
+        ASSERT_EQ(mkfifo(dir_.file("fifo").c_str(), 0600), 0);
         // The child may run as nobody: it must reach the directory and its
         // state file, but not the locked device.
         chmod(dir_.file("").c_str(), 0777);
