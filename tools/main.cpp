@@ -11,6 +11,7 @@
 #include "tools/plugin_path.h"
 #include "tools/ports.h"
 #include "tools/run_command.h"
+#include "tools/terminal_state.h"
 #include "xtokline/text.h"
 
 namespace {
@@ -66,6 +67,7 @@ bool pluginPath(std::string& path) {
 }  // namespace
 
 int main(int argc, char** argv) {
+    keepTerminalSettings();
     CLI::App app{
         "xtok-host loads the xtokline serial token plug-in as an operator panel's runtime "
         "does, on this PC's serial ports."};

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 #include <sys/file.h>
 #include <sys/stat.h>
+#include <termios.h>
 #include <unistd.h>
 
 #include <fstream>
@@ -12,6 +13,7 @@
 
 #include "host/permanent_storage.h"
 #include "tests/host/temp_dir.h"
+#include "tests/host/terminal_settings.h"
 #include "tests/tools/subprocess.h"
 #include "tools/pty_pair.h"
 #include "tools/simulated_device.h"
@@ -200,6 +202,81 @@ TEST_F(Session, AScriptOnStandardInputGoesOnAfterAFailureAndSaysSoAtTheEnd) {
         (std::vector<std::string>{"error: bad tag address '0?nope?int': Can't access memory type",
                                   "error: write: incorrect length of data to write",
                                   "error: set_hexToken: wrong value"}));
+}
+
+/// A pseudo-terminal as a person's terminal: cooked, as a shell leaves it.
+class Terminal {
+public:
+    Terminal() {
+        master_ = posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
+        if (master_ >= 0 && grantpt(master_) == 0 && unlockpt(master_) == 0) {
+            slave_ = ptsname(master_);
+            held_ = open(slave_.c_str(), O_RDWR | O_NOCTTY | O_CLOEXEC);
+        }
+    }
+    ~Terminal() {
+        close(held_);
+        close(master_);
+    }
+    const std::string& slave() const { return slave_; }
+    std::string settings() const {
+        termios t{};
+        return tcgetattr(held_, &t) == 0 ? host::test::settingsText(t) : "none";
+    }
+    bool type(const std::string& text) {
+        return write(master_, text.data(), text.size()) == static_cast<ssize_t>(text.size());
+    }
+
+private:
+    int master_ = -1;
+    int held_ = -1;
+    std::string slave_;
+};
+
+struct TerminalCase {
+    const char* what;
+    bool portOnTerminal;      // the configured port is /dev/tty, the run's own terminal
+    const char* script;       // --exec, or null for a session typed at the prompt
+    const char* runningWhen;  // the output that shows it runs
+    bool sigterm;             // ended by SIGTERM, else by its script or a typed quit
+    int status;
+};
+
+const TerminalCase kTerminalCases[] = {
+    {"a script on the terminal's port", true, "get_stat", nullptr, false, 0},
+    {"a failing script on the terminal's port", true, "tag read 0?x?int", nullptr, false, 1},
+    {"SIGTERM in a watch on the terminal's port", true, "get_stat; watch", "Connected", true, 0},
+    {"quit typed at the prompt", false, nullptr, "xtok> ", false, 0},
+    {"SIGTERM at the prompt", false, nullptr, "xtok> ", true, 0},
+};
+
+// However a run ends, the terminal it was started on is left as it was:
+// readline's settings and those of a port on the terminal itself are undone.
+TEST_F(Session, TheTerminalIsLeftAsItWasHoweverTheRunEnds) {
+    for (const TerminalCase& c : kTerminalCases) {
+        Terminal terminal;
+        const std::string before = terminal.settings();
+        std::vector<std::string> arguments = run({});
+        if (c.portOnTerminal) {
+            arguments[3] = configFor("com1");
+            arguments.insert(arguments.end(), {"--map", "com1=/dev/tty"});
+        }
+        if (c.script) {
+            arguments.insert(arguments.end(), {"--exec", c.script});
+        }
+        Subprocess session(arguments, "", false, terminal.slave());
+        if (c.runningWhen) {
+            ASSERT_TRUE(session.waitForOutput(c.runningWhen, 10s)) << c.what;
+        }
+        if (c.sigterm) {
+            kill(session.pid(), SIGTERM);
+        } else if (!c.script) {
+            ASSERT_TRUE(terminal.type("quit\n"));
+        }
+        Finished done = session.finish(10s);
+        EXPECT_EQ(done.status, c.status) << c.what << ": " << done.err;
+        EXPECT_EQ(terminal.settings(), before) << c.what;
+    }
 }
 
 TEST(Cli, DescribeShowsTheNineteenMemoryTypesAndTheWholeXml) {
