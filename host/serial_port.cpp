@@ -119,7 +119,7 @@ bool SerialPort::Configure(int32_t baud, int32_t parity, int32_t bits, int32_t s
         why = port_ ? applyWithLibserialport(port_, settings) : applyWithTermios(fd_, settings);
     }
     if (!why.empty()) {
-        factory_.notice(device_ + ": " + why);
+        factory_.refused(device_ + ": " + why);
         return false;
     }
     why = applyLineMode(fd_, mode);
