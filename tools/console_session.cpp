@@ -28,6 +28,9 @@ const char* const kHostHelp =
     "                             show received tokens (time, text, hex) and acknowledge\n"
     "                             them, until Ctrl-C, N tokens or the time-out\n"
     "  settings                   the line settings: active, and the SP_ values\n"
+    "  reset-retained             forget the settings SP_Done retained for this\n"
+    "                             instance and start the plug-in anew with the\n"
+    "                             configured ones\n"
     "  help                       this text and the plug-in's console commands\n"
     "  quit                       leave (also exit, or the end of input)\n"
     "Values: numbers in decimal or 0x hex; booleans 0/1, true/false, on/off;\n"
@@ -122,11 +125,30 @@ ConsoleSession::ConsoleSession(PluginSession& session, bool json, std::ostream& 
 bool ConsoleSession::run(LineInput& input) {
     bool allGood = true;
     std::string line;
+    showMessages();
     while (!quit_ && input.next(line)) {
         allGood = execute(line) && allGood;
+        showMessages();
         out_.flush();
     }
     return allGood;
+}
+
+// As the host's notices are: a line on standard error, or an event among
+// the results under --json.
+void ConsoleSession::showMessages() {
+    for (const SessionMessage& message : session_.takeMessages()) {
+        if (json_) {
+            out_ << JsonLine()
+                        .text("event", message.warning ? "warning" : "notice")
+                        .text("text", message.text)
+                        .str()
+                 << '\n';
+        } else {
+            err_ << "xtok-host: " << (message.warning ? "warning: " : "") << message.text
+                 << std::endl;
+        }
+    }
 }
 
 bool ConsoleSession::execute(const std::string& raw) {
@@ -151,6 +173,9 @@ bool ConsoleSession::execute(const std::string& raw) {
     }
     if (word == "settings") {
         return settings(line);
+    }
+    if (word == "reset-retained") {
+        return resetRetained(line);
     }
     // As typed but for the margins: "put" sends the rest of its line,
     // trailing blanks included.
@@ -303,6 +328,16 @@ bool ConsoleSession::settings(const std::string& line) {
     }
     text += "SP_ values written here wait for SP_Done, which applies and keeps them.\n";
     report(json.str(), text);
+    return true;
+}
+
+bool ConsoleSession::resetRetained(const std::string& line) {
+    std::string cleared;
+    std::string error;
+    if (!session_.resetRetained(cleared, error)) {
+        return fail(line, error);
+    }
+    report(JsonLine().text("command", line).flag("ok", true).text("reply", cleared).str(), cleared);
     return true;
 }
 

@@ -95,8 +95,8 @@ int main(int argc, char** argv) {
         "watch, settings, and the plug-in's own commands");
     runCommand->footer(
         "Console: tag read ADDRESS, tag write ADDRESS VALUE, watch [--count N] [--timeout S], "
-        "settings, help, quit; any other line goes to the plug-in's own console. help "
-        "explains the values. Exit status 1 when any command failed.");
+        "settings, reset-retained, help, quit; any other line goes to the plug-in's own "
+        "console. help explains the values. Exit status 1 when any command failed.");
     runCommand->add_option("--config", run.config, "Configuration text, or @FILE holding it")
         ->required();
     runCommand->add_option("--map", run.maps,
@@ -112,6 +112,8 @@ int main(int argc, char** argv) {
         "--exec", run.exec,
         "Commands separated by ';' (\\; for one inside a value) instead of standard input");
     runCommand->add_flag("--json", run.json, "One JSON object per result, one per line");
+    runCommand->add_flag("--reset-retained", run.resetRetained,
+                         "Forget the settings SP_Done retained for the instance before starting");
 
     std::string describePath;
     bool wholeXml = false;

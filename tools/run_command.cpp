@@ -31,6 +31,7 @@ int runConsole(const RunOptions& options, std::ostream& out, std::ostream& err) 
     session.pluginPath = options.pluginPath;
     session.statePath = options.statePath;
     session.instanceName = options.instanceName;
+    session.resetRetained = options.resetRetained;
     bool usable = configText(options.config, session.config, error);
     for (const std::string& map : options.maps) {
         usable = usable && session.ports.assign(map, error);

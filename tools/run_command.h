@@ -15,6 +15,7 @@ struct RunOptions {
     std::string instanceName;
     std::string exec;  // "cmd; cmd" instead of standard input
     bool json = false;
+    bool resetRetained = false;
 };
 
 /// Exit status: 0 when every command succeeded, 1 when one failed or the

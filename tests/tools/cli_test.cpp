@@ -154,6 +154,38 @@ TEST_F(Session, RetainedSettingsSurviveARestart) {
     EXPECT_EQ(done.out, "19200\n\"0D0A\"\n") << done.err;
 }
 
+// Line settings retained in the state file that the port refuses do not
+// lock the operator out: the run starts disconnected and says which they are
+// and how to clear them; reset-retained and --reset-retained clear them.
+TEST_F(Session, RefusedRetainedSettingsStartDisconnectedUntilCleared) {
+    const std::string state = dir_.file("retained.sqlite3");
+    auto retain = [&] {
+        std::string error;
+        auto storage = host::PermanentStorage::open(state, error);
+        ASSERT_NE(storage, nullptr) << error;
+        storage->WriteInt("XTOK", "baud", 14400);  // no terminal has it
+        storage->WriteInt("XTOK", "token_queue_size", 0);
+    };
+    const std::string cleared = "cleared the settings retained in " + state +
+                                " for instance XTOK: baud=14400 token_queue_size=0";
+    retain();
+    Finished done = runTool(
+        run({"--exec", "get_stat; reset-retained; get_stat; tag read 0?SP_Baud?unsignedInt"}));
+    EXPECT_EQ(done.status, 0) << done.err;
+    EXPECT_EQ(done.out, "Disconnected\n" + cleared + "; the plug-in started anew on " +
+                            line_->slavePath() + ",9600,none,8,1,RS-232\nConnected\n9600\n");
+    const std::string reported[] = {
+        "baud 14400 (configured 9600)", "kept in " + state + " for instance XTOK",
+        "started disconnected. reset-retained", "the retained token_queue_size 0"};
+    for (const std::string& said : reported) {
+        EXPECT_NE(done.err.find(said), std::string::npos) << said << " in " << done.err;
+    }
+    retain();
+    done = runTool(run({"--reset-retained", "--exec", "get_stat"}));
+    EXPECT_EQ(done.out, "Connected\n");
+    EXPECT_EQ(done.err, "xtok-host: " + cleared + "\n");
+}
+
 TEST_F(Session, CtrlCEndsAWatchAndTheScriptGoesOn) {
     device_.reset();
     DeviceOptions reader;
@@ -300,7 +332,8 @@ TEST(Cli, PortsListsWhatThereIsAndSaysWhatItCannot) {
     EXPECT_NE(done.out.find("Pseudo-terminals (/dev/pts/N) are not listed"), std::string::npos);
 }
 
-// Every bad input: one line on standard error, its reason, the right status.
+// Every bad input: one line on standard error, its reason, the right status
+// (0 for a value that only earns a warning).
 // In the arguments, {line} is a free pseudo-terminal, {busy} one that another
 // program holds, {locked} a file the user may not open, {dir} a scratch
 // directory (with big.cfg, a file past 1 MiB; zero.cfg, one with a zero
@@ -356,6 +389,16 @@ const BadInput kBadInputs[] = {
      "--count",
      1},
     {"bad port map", {"run", "--config", kNoPort, "--map", "com99=/dev/x"}, "comN=DEVICE", 2},
+    {"queue size below the editor's range",
+     {"run", "--config", kNoPort + " port={line}", "--exec",
+      "tag write 0?SP_TokenQueueSize?unsignedInt 0"},
+     "warning: SP_TokenQueueSize 0 lies outside the project editor's range 1 to 10000",
+     0},
+    {"queue size above the editor's range",
+     {"run", "--config", kNoPort + " port={line}", "--exec",
+      "tag write 0?SP_TokenQueueSize?unsignedInt 10001"},
+     "SP_TokenQueueSize 10001 lies outside",
+     0},
     {"configuration file missing", {"run", "--config", "@{dir}/none.cfg"}, "cannot read", 2},
     {"configuration file too large", {"run", "--config", "@{dir}/big.cfg"}, "at most 1 MiB", 2},
     {"configuration file with a zero byte", {"run", "--config", "@{dir}/zero.cfg"}, "zero byte", 2},
