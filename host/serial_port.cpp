@@ -62,7 +62,7 @@ SerialPort::SerialPort(std::string device, SerialFactory& factory, sp_port* port
 // not hang the close.
 SerialPort::~SerialPort() {
     if (restore_) {
-        tcsetattr(fd_, TCSANOW, &original_);
+        restoreTerminal(fd_, original_);
     }
     if (port_) {
         sp_close(port_);

@@ -7,6 +7,8 @@
 #include <cstdlib>
 #include <exception>
 
+#include "host/serial_line.h"
+
 namespace xtok::tools {
 
 namespace {
@@ -36,7 +38,7 @@ void keepTerminalSettings() {
 
 void restoreTerminalSettings() {
     if (haveKept) {
-        tcsetattr(STDIN_FILENO, TCSANOW, &kept);
+        host::restoreTerminal(STDIN_FILENO, kept);
     }
 }
 
