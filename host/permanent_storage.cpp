@@ -151,10 +151,12 @@ bool PermanentStorage::write(const char* section, const char* key, const char* k
     return done;
 }
 
+// Deferred: the file is locked by the first write, so that a call which
+// retains nothing neither waits for nor fails on another program's lock.
 bool PermanentStorage::begin(std::string& error) {
     std::lock_guard<std::mutex> lock(mutex_);
     failure_.clear();
-    if (sqlite3_exec(db_, "BEGIN IMMEDIATE", nullptr, nullptr, nullptr) != SQLITE_OK) {
+    if (sqlite3_exec(db_, "BEGIN", nullptr, nullptr, nullptr) != SQLITE_OK) {
         error = sqlite3_errmsg(db_);
         return false;
     }

@@ -143,6 +143,22 @@ TEST_F(Session, AKillDuringSpDoneLeavesTheOldSetOrTheNew) {
     }
 }
 
+// While another program holds the state file, what must be retained fails
+// and says why; what retains nothing goes on as usual.
+TEST_F(Session, ALockedStateFileFailsOnlyWhatItMustKeep) {
+    std::string error;
+    auto holder = host::PermanentStorage::open(dir_.file("retained.sqlite3"), error);
+    ASSERT_TRUE(holder && holder->begin(error) && holder->WriteInt("XTOK", "gap", 1)) << error;
+    Finished done = runTool(run({"--exec",
+                                 "get_stat; tag write 0?SP_Gap?unsignedInt 5; "
+                                 "tag write 0?SP_Done?boolean 1; tag read 0?SP_Gap?unsignedInt"}));
+    EXPECT_EQ(done.status, 1);
+    EXPECT_EQ(done.out, "Connected\nok\n5\n");
+    EXPECT_EQ(done.err,
+              "error: 0?SP_Done?boolean written, but its settings are not retained: database "
+              "is locked\n");
+}
+
 // SP_Done keeps the settings in the state file: the next run starts with them.
 TEST_F(Session, RetainedSettingsSurviveARestart) {
     Finished done = runTool(run({"--exec",
