@@ -304,11 +304,10 @@ bool ConsoleSession::watch(const std::string& line, const std::vector<std::strin
 }
 
 bool ConsoleSession::settings(const std::string& line) {
-    char active[256] = {};
-    session_.protocol().GetSerialSettings(active, sizeof active - 1);
+    const std::string active = session_.serialSettings();
     JsonLine json;
     json.text("command", line).flag("ok", true).text("active", active);
-    std::string text = "active line        " + std::string(active) + "\n";
+    std::string text = "active line        " + active + "\n";
     for (const Setting& setting : kSettings) {
         TagValue value;
         std::string error;

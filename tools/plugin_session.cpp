@@ -107,8 +107,7 @@ bool PluginSession::configureAndStart(std::string& error) {
         error = "bad configuration: " + lastError();
         return false;
     }
-    char configured[256] = {};
-    protocol.GetSerialSettings(configured, sizeof configured - 1);
+    const std::string configured = serialSettings();
     const int refusals = host_->serialFactory().refusals();
     bool started = false;
     {
@@ -201,10 +200,16 @@ bool PluginSession::resetRetained(std::string& report, std::string& error) {
         report += "; the plug-in started anew, disconnected (" + why + ")";
         return true;
     }
-    char active[256] = {};
-    protocol_->GetSerialSettings(active, sizeof active - 1);
-    report += std::string("; the plug-in started anew on ") + active;
+    report += "; the plug-in started anew on " + serialSettings();
     return true;
+}
+
+// The port's name comes from the configuration and may be long; the rest of
+// the text is a few numbers and names.
+std::string PluginSession::serialSettings() {
+    std::vector<char> text(config_.size() + 64, '\0');
+    protocol_->GetSerialSettings(text.data(), static_cast<int32_t>(text.size() - 1));
+    return text.data();
 }
 
 void PluginSession::say(bool warning, const std::string& text) {

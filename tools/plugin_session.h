@@ -67,6 +67,8 @@ public:
     PluginSession& operator=(const PluginSession&) = delete;
 
     IProtocol7& protocol() { return *protocol_; }
+    /// The protocol's line as GetSerialSettings tells it, whole.
+    std::string serialSettings();
 
     /// A tag by its address, made once and kept. Null with `error` set.
     ITag* tag(const std::string& address, std::string& error);

@@ -49,10 +49,8 @@ int runConsole(const RunOptions& options, std::ostream& out, std::ostream& err) 
     std::unique_ptr<LineInput> input =
         options.exec.empty() ? LineInput::fromStdin("xtok> ") : LineInput::fromText(options.exec);
     if (typed && !options.json) {
-        char line[256] = {};
-        started->protocol().GetSerialSettings(line, sizeof line - 1);
-        out << "xtok-host: " << started->protocol().GetDisplayName() << " on " << line
-            << "; help lists the commands, quit leaves" << std::endl;
+        out << "xtok-host: " << started->protocol().GetDisplayName() << " on "
+            << started->serialSettings() << "; help lists the commands, quit leaves" << std::endl;
     }
     ConsoleSession console(*started, options.json, out, err);
     return console.run(*input) ? 0 : 1;

@@ -184,12 +184,18 @@ TEST_F(Session, RefusedRetainedSettingsStartDisconnectedUntilCleared) {
     };
     const std::string cleared = "cleared the settings retained in " + state +
                                 " for instance XTOK: baud=14400 token_queue_size=0";
+    // A port name longer than any fixed buffer for the settings text.
+    const std::string longPort = dir_.file(std::string(200, 'd')) + "/" + std::string(100, 'p');
+    ASSERT_EQ(mkdir(dir_.file(std::string(200, 'd')).c_str(), 0700), 0);
+    ASSERT_EQ(symlink(line_->slavePath().c_str(), longPort.c_str()), 0);
     retain();
-    Finished done = runTool(
-        run({"--exec", "get_stat; reset-retained; get_stat; tag read 0?SP_Baud?unsignedInt"}));
+    std::vector<std::string> arguments =
+        run({"--exec", "get_stat; reset-retained; get_stat; tag read 0?SP_Baud?unsignedInt"});
+    arguments[3] = configFor(longPort);
+    Finished done = runTool(arguments);
     EXPECT_EQ(done.status, 0) << done.err;
-    EXPECT_EQ(done.out, "Disconnected\n" + cleared + "; the plug-in started anew on " +
-                            line_->slavePath() + ",9600,none,8,1,RS-232\nConnected\n9600\n");
+    EXPECT_EQ(done.out, "Disconnected\n" + cleared + "; the plug-in started anew on " + longPort +
+                            ",9600,none,8,1,RS-232\nConnected\n9600\n");
     const std::string reported[] = {
         "baud 14400 (configured 9600)", "kept in " + state + " for instance XTOK",
         "started disconnected. reset-retained", "the retained token_queue_size 0"};
