@@ -138,12 +138,15 @@ bool PluginSession::configureAndStart(std::string& error) {
 bool PluginSession::startDisconnected(const std::string& configured, int refusalsBefore,
                                       const std::string& why) {
     host::PermanentStorage* storage = host_->permanentStorage();
-    if (!storage || host_->serialFactory().refusals() == refusalsBefore) {
+    std::string port;
+    LineSettings line;
+    if (!storage || host_->serialFactory().refusals() == refusalsBefore ||
+        !parseSerialSettings(configured, port, line)) {
         return false;
     }
     RetainedSettings retained(*storage, protocol_->GetInstanceName());
-    const std::string refused = retained.lineDifferences(configured);
-    if (refused.empty() || !startWithoutPort()) {
+    const std::string refused = retained.lineDifferences(line);
+    if (refused.empty() || !portTakes(port, line) || !startWithoutPort()) {
         return false;
     }
     say(true, "the port refused line settings that SP_Done retained: " + refused + " [" + why +
@@ -151,6 +154,20 @@ bool PluginSession::startDisconnected(const std::string& configured, int refusal
                   "; started disconnected. reset-retained, or run --reset-retained, clears "
                   "them; or set others with SP_ tags and SP_Done, then connect ON");
     return true;
+}
+
+// Whether the configured settings are the port's to refuse as well: then the
+// retained ones are not to blame.
+bool PluginSession::portTakes(const std::string& port, const LineSettings& line) {
+    host::SerialFactory& ports = host_->serialFactory();
+    ISerialPort* opened = ports.Open(port.c_str());
+    const bool taken =
+        opened && opened->Configure(line.baud, line.parity, line.bits, line.stop, line.mode);
+    if (opened) {
+        ports.Close(opened);
+    }
+    relay_->takeHeld();  // said by the start error, if it comes to that
+    return taken;
 }
 
 // autoConnect=false as the section's first entry wins over any later one.

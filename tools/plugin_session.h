@@ -12,6 +12,7 @@
 #include "host/plugin_loader.h"
 #include "host/service_provider.h"
 #include "tools/tag_values.h"
+#include "xtokline/constants.h"
 
 namespace xtok::tools {
 
@@ -105,6 +106,7 @@ private:
                            const std::string& why);
     /// Configures again with autoConnect=false and starts.
     bool startWithoutPort();
+    bool portTakes(const std::string& port, const LineSettings& line);
     bool clearRetained(std::string& report, std::string& error);
     void say(bool warning, const std::string& text);
     void warnAboutQueueSize(const std::string& address);

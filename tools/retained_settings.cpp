@@ -4,8 +4,6 @@
 #include <vector>
 
 #include "protocol/settings.h"
-#include "xtokline/constants.h"
-#include "xtokline/text.h"
 
 namespace xtok::tools {
 
@@ -31,24 +29,10 @@ int32_t codeOf(const char* const* names, int count, const std::string& name) {
     return -1;
 }
 
-/// The five line settings of "port,baud,parity,bits,stop,mode", whose order
-/// is that of the rows kBaud to kMode; the port name, which may hold commas,
-/// is skipped by counting from the end.
-bool lineValues(const std::string& text, int32_t (&values)[kMode + 1]) {
-    std::vector<std::string> fields;
-    splitTrimmed(text, ',', fields);
-    if (fields.size() < 6) {
-        return false;
-    }
-    const std::size_t first = fields.size() - 5;
-    for (int id = kBaud; id <= kMode; ++id) {
-        const std::string& field = fields[first + static_cast<std::size_t>(id)];
-        const SpelledAs spelledAs = kSettings[id].spelledAs;
-        values[id] = spelledAs == SpelledAs::ParityName ? codeOf(kParityNames, kParityCount, field)
-                     : spelledAs == SpelledAs::ModeName ? codeOf(kModeNames, kModeCount, field)
-                                                        : std::atoi(field.c_str());
-    }
-    return true;
+/// The value of one of the rows kBaud to kMode.
+int32_t lineValue(const LineSettings& line, int id) {
+    const int32_t values[] = {line.baud, line.parity, line.bits, line.stop, line.mode};
+    return values[id];
 }
 
 }  // namespace
@@ -57,11 +41,7 @@ std::string RetainedSettings::where() const {
     return "in " + storage_.path() + " for instance " + instance_;
 }
 
-std::string RetainedSettings::lineDifferences(const std::string& configured) {
-    int32_t values[kMode + 1] = {};
-    if (!lineValues(configured, values)) {
-        return "";
-    }
+std::string RetainedSettings::lineDifferences(const LineSettings& configured) {
     std::string differences;
     for (int id = kBaud; id <= kMode; ++id) {
         const Setting& setting = kSettings[id];
@@ -69,10 +49,10 @@ std::string RetainedSettings::lineDifferences(const std::string& configured) {
             continue;
         }
         const int32_t retained = storage_.ReadInt(instance_.c_str(), setting.key);
-        if (retained != values[id]) {
+        const int32_t value = lineValue(configured, id);
+        if (retained != value) {
             differences += std::string(differences.empty() ? "" : ", ") + setting.key + " " +
-                           shown(setting, retained) + " (configured " + shown(setting, values[id]) +
-                           ")";
+                           shown(setting, retained) + " (configured " + shown(setting, value) + ")";
         }
     }
     return differences;
@@ -114,6 +94,27 @@ std::string queueSizeWarning(int32_t size, const std::string& what, const std::s
            std::to_string(row.editorHigh) + "; the plug-in takes it all the same, and its queue " +
            (size < row.editorLow ? "keeps only the newest token"
                                  : "may hold that many tokens in memory");
+}
+
+// The port's name may hold commas: the five fields are counted from the end.
+bool parseSerialSettings(const std::string& text, std::string& port, LineSettings& line) {
+    std::size_t end = text.size();
+    std::string fields[5];
+    for (int i = 4; i >= 0; --i) {
+        const std::size_t comma = end == 0 ? std::string::npos : text.rfind(',', end - 1);
+        if (comma == std::string::npos) {
+            return false;
+        }
+        fields[i] = text.substr(comma + 1, end - comma - 1);
+        end = comma;
+    }
+    port = text.substr(0, end);
+    line.baud = std::atoi(fields[0].c_str());
+    line.parity = codeOf(kParityNames, kParityCount, fields[1]);
+    line.bits = std::atoi(fields[2].c_str());
+    line.stop = std::atoi(fields[3].c_str());
+    line.mode = codeOf(kModeNames, kModeCount, fields[4]);
+    return line.parity >= 0 && line.mode >= 0;
 }
 
 }  // namespace xtok::tools

@@ -7,6 +7,7 @@
 #include <string>
 
 #include "host/permanent_storage.h"
+#include "xtokline/constants.h"
 
 namespace xtok::tools {
 
@@ -17,10 +18,9 @@ public:
 
     /// "in FILE for instance NAME".
     std::string where() const;
-    /// The retained line settings that differ from `configured` (the text
-    /// GetSerialSettings gave before Start), e.g. "baud 14400 (configured
-    /// 9600)"; "" when there are none.
-    std::string lineDifferences(const std::string& configured);
+    /// The retained line settings that differ from the `configured` ones,
+    /// e.g. "baud 14400 (configured 9600)"; "" when there are none.
+    std::string lineDifferences(const LineSettings& configured);
     /// A warning about the retained token_queue_size, or "".
     std::string queueSizeWarning();
     /// Forgets them all; `report` says what was cleared. False with `error`.
@@ -35,5 +35,9 @@ private:
 /// editor accepts, naming what it is and where it came from; "" when it
 /// lies within.
 std::string queueSizeWarning(int32_t size, const std::string& what, const std::string& where = "");
+
+/// The port and line of a settings text as GetSerialSettings gives it,
+/// "port,baud,parity,bits,stop,mode"; false when it has another form.
+bool parseSerialSettings(const std::string& text, std::string& port, LineSettings& line);
 
 }  // namespace xtok::tools
