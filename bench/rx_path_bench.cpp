@@ -32,6 +32,7 @@
 #include "host/serial_port.h"
 #include "module/interface_factory.h"
 #include "protocol/protocol_xtok.h"
+#include "protocol/xtok_config.h"
 
 namespace {
 
@@ -41,8 +42,8 @@ struct Mode {
     const char* name;
     const char* prefix;
     const char* suffix;
-    std::string unit;          // bytes of one burst of the line
-    bool silenceAfterUnit;     // a read time-out after each burst
+    std::string unit;       // bytes of one burst of the line
+    bool silenceAfterUnit;  // a read time-out after each burst
     int tokensPerUnit;
 };
 
@@ -181,10 +182,14 @@ public:
     explicit BenchHost(const Mode& mode) : serial_(mode) {}
     void* GetService(const char* name) override {
         std::string n = name ? name : "";
-        if (n == "IMultiTask2") return static_cast<IMultiTask2*>(&tasks_);
-        if (n == "ISerialFactory") return static_cast<ISerialFactory*>(&serial_);
-        if (n == "ISocketFactory") return static_cast<ISocketFactory*>(&sockets_);
-        if (n == "ICDSBuffer") return static_cast<ICDSBuffer*>(&cds_);
+        if (n == "IMultiTask2")
+            return static_cast<IMultiTask2*>(&tasks_);
+        if (n == "ISerialFactory")
+            return static_cast<ISerialFactory*>(&serial_);
+        if (n == "ISocketFactory")
+            return static_cast<ISocketFactory*>(&sockets_);
+        if (n == "ICDSBuffer")
+            return static_cast<ICDSBuffer*>(&cds_);
         return nullptr;
     }
     void ReleaseService(void*) override {}
@@ -206,9 +211,10 @@ public:
             std::exit(1);
         }
         protocol_ = static_cast<Protocol_XTOK*>(rootObject().factory().CreateProtocol("XTOK"));
-        std::string config = std::string("CfgVer=1 model=1 port=mem baudrate=115200 parity=none "
-                                         "bits=8 stopbits=1 mode=RS-232 token_queue_size=10000 "
-                                         "rx_prefix=") +
+        std::string config = std::string(
+                                 "CfgVer=1 model=1 port=mem baudrate=115200 parity=none "
+                                 "bits=8 stopbits=1 mode=RS-232 token_queue_size=10000 "
+                                 "rx_prefix=") +
                              mode.prefix + " rx_suffix=" + mode.suffix;
         if (!protocol_->Configure(config.c_str()) || !protocol_->Start()) {
             std::fprintf(stderr, "protocol: %s\n", protocol_->GetLastErrorText());
@@ -289,9 +295,8 @@ void consumePath(benchmark::State& state) {
         tokens += 1000;
     }
     state.SetItemsProcessed(tokens);
-    state.counters["ns_per_token"] =
-        benchmark::Counter(static_cast<double>(tokens),
-                           benchmark::Counter::kIsRate | benchmark::Counter::kInvert);
+    state.counters["ns_per_token"] = benchmark::Counter(
+        static_cast<double>(tokens), benchmark::Counter::kIsRate | benchmark::Counter::kInvert);
     protocol.DeleteTag(available);
     protocol.DeleteTag(token);
     protocol.DeleteTag(ack);
@@ -341,6 +346,25 @@ void hostLock(benchmark::State& state) {
     tasks.DestroyMutex(mutex);
 }
 
+// A configuration of many node sections, read as Configure reads it: the
+// reader must stay linear in their number.
+void manyNodes(benchmark::State& state) {
+    const auto count = static_cast<std::size_t>(state.range(0));
+    std::string text =
+        "CfgVer=1 model=1 port=com1 baudrate=9600 parity=none bits=8 stopbits=1 mode=RS-232";
+    for (std::size_t i = 0; i < count; ++i) {
+        text += " Node" + std::to_string(i) + "::model=1";
+    }
+    for (auto _ : state) {
+        XtokConfig config;
+        if (!config.Parse(text) || config.nodes().size() != count) {
+            state.SkipWithError("the configuration was not read whole");
+            break;
+        }
+    }
+    state.SetItemsProcessed(static_cast<int64_t>(state.iterations() * count));
+}
+
 int replay(const std::string& name, uint64_t bytes) {
     for (const Mode& mode : modes()) {
         if (name != mode.name) {
@@ -379,6 +403,10 @@ int main(int argc, char** argv) {
     }
     benchmark::RegisterBenchmark("HostLock/LockUnlock", hostLock);
     benchmark::RegisterBenchmark("Runtime/ReadAndAck", consumePath);
+    benchmark::RegisterBenchmark("Configure/Nodes", manyNodes)
+        ->Arg(10000)
+        ->Arg(100000)
+        ->Unit(benchmark::kMillisecond);
     benchmark::RegisterBenchmark("Kernel/TwoWakeUpsPerToken", twoWakeUps)
         ->MeasureProcessCPUTime()
         ->UseRealTime()

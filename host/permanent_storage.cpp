@@ -29,6 +29,9 @@ constexpr const char* kUpsert =
     " VALUES (?1, ?2, ?3, ?4, ?5)";
 constexpr const char* kSelect =
     "SELECT \"int\", \"text\" FROM retained WHERE section = ?1 AND key = ?2";
+constexpr const char* kList =
+    "SELECT key, kind, \"int\", \"text\" FROM retained WHERE section = ?1 ORDER BY key";
+constexpr const char* kClear = "DELETE FROM retained WHERE section = ?1";
 
 // A second host on the same file holds its lock only for one short write.
 constexpr int kBusyTimeoutMs = 2000;
@@ -50,6 +53,17 @@ bool bindName(sqlite3_stmt* statement, const char* section, const char* key) {
            sqlite3_bind_text(statement, 2, key, -1, SQLITE_TRANSIENT) == SQLITE_OK;
 }
 
+std::string shownValue(sqlite3_stmt* row) {
+    const unsigned char* kindColumn = sqlite3_column_text(row, 1);
+    const std::string kind = kindColumn ? reinterpret_cast<const char*>(kindColumn) : "";
+    if (kind == "text") {
+        const unsigned char* text = sqlite3_column_text(row, 3);
+        return "\"" + std::string(text ? reinterpret_cast<const char*>(text) : "") + "\"";
+    }
+    const int64_t number = sqlite3_column_int64(row, 2);
+    return kind == "bool" ? (number ? "true" : "false") : std::to_string(number);
+}
+
 }  // namespace
 
 std::string defaultStoragePath() {
@@ -64,7 +78,8 @@ std::string defaultStoragePath() {
     return "";
 }
 
-PermanentStorage::PermanentStorage(sqlite3* db) : HostService("IPermanentStorage"), db_(db) {}
+PermanentStorage::PermanentStorage(sqlite3* db, std::string path)
+    : HostService("IPermanentStorage"), db_(db), path_(std::move(path)) {}
 
 PermanentStorage::~PermanentStorage() {
     sqlite3_finalize(upsert_);
@@ -85,7 +100,7 @@ std::unique_ptr<PermanentStorage> PermanentStorage::open(const std::string& path
     int result =
         sqlite3_open_v2(path.c_str(), &db, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE, nullptr);
     // The handle exists even when opening failed and is freed by the object.
-    std::unique_ptr<PermanentStorage> storage(new PermanentStorage(db));
+    std::unique_ptr<PermanentStorage> storage(new PermanentStorage(db, path));
     if (result != SQLITE_OK || !storage->prepare()) {
         error = "cannot use " + path +
                 " as permanent storage: " + (db ? sqlite3_errmsg(db) : "out of memory");
@@ -136,10 +151,12 @@ bool PermanentStorage::write(const char* section, const char* key, const char* k
     return done;
 }
 
+// Deferred: the file is locked by the first write, so that a call which
+// retains nothing neither waits for nor fails on another program's lock.
 bool PermanentStorage::begin(std::string& error) {
     std::lock_guard<std::mutex> lock(mutex_);
     failure_.clear();
-    if (sqlite3_exec(db_, "BEGIN IMMEDIATE", nullptr, nullptr, nullptr) != SQLITE_OK) {
+    if (sqlite3_exec(db_, "BEGIN", nullptr, nullptr, nullptr) != SQLITE_OK) {
         error = sqlite3_errmsg(db_);
         return false;
     }
@@ -217,6 +234,40 @@ bool PermanentStorage::ReadTextTo(const char* section, const char* key, char* bu
     }
     std::memcpy(buffer, text.c_str(), text.size() + 1);
     return true;
+}
+
+bool PermanentStorage::list(const std::string& section, std::vector<StoredEntry>& values,
+                            std::string& error) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    sqlite3_stmt* query = nullptr;
+    int result = sqlite3_prepare_v2(db_, kList, -1, &query, nullptr);
+    if (result == SQLITE_OK) {
+        sqlite3_bind_text(query, 1, section.c_str(), -1, SQLITE_TRANSIENT);
+        while ((result = sqlite3_step(query)) == SQLITE_ROW) {
+            const unsigned char* key = sqlite3_column_text(query, 0);
+            values.push_back({key ? reinterpret_cast<const char*>(key) : "", shownValue(query)});
+        }
+    }
+    if (result != SQLITE_DONE) {
+        error = sqlite3_errmsg(db_);
+    }
+    sqlite3_finalize(query);
+    return result == SQLITE_DONE;
+}
+
+bool PermanentStorage::clear(const std::string& section, std::string& error) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    sqlite3_stmt* statement = nullptr;
+    int result = sqlite3_prepare_v2(db_, kClear, -1, &statement, nullptr);
+    if (result == SQLITE_OK) {
+        sqlite3_bind_text(statement, 1, section.c_str(), -1, SQLITE_TRANSIENT);
+        result = sqlite3_step(statement);
+    }
+    if (result != SQLITE_DONE) {
+        error = sqlite3_errmsg(db_);
+    }
+    sqlite3_finalize(statement);
+    return result == SQLITE_DONE;
 }
 
 }  // namespace xtok::host

@@ -4,6 +4,7 @@
 #include <memory>
 #include <mutex>
 #include <string>
+#include <vector>
 
 #include "host/host_service.h"
 
@@ -15,6 +16,13 @@ namespace xtok::host {
 /// $XDG_STATE_HOME/xtokline/retained.sqlite3, else
 /// ~/.local/state/xtokline/retained.sqlite3; "" when neither variable is set.
 std::string defaultStoragePath();
+
+/// A stored value for people: its key and its value as a number, true or
+/// false, or a quoted text.
+struct StoredEntry {
+    std::string key;
+    std::string shown;
+};
 
 class PermanentStorage final : public HostService<IPermanentStorage2> {
 public:
@@ -44,8 +52,14 @@ public:
     /// them does, none is kept: false with the first reason.
     bool commit(std::string& error);
 
+    /// The values of `section` by key. False with the reason.
+    bool list(const std::string& section, std::vector<StoredEntry>& values, std::string& error);
+    /// Forgets every value of `section`. False with the reason.
+    bool clear(const std::string& section, std::string& error);
+    const std::string& path() const { return path_; }
+
 private:
-    explicit PermanentStorage(sqlite3* db);
+    PermanentStorage(sqlite3* db, std::string path);
     /// Settings, table and statements; false with the reason in sqlite3_errmsg.
     bool prepare();
     bool writable() const;
@@ -56,6 +70,7 @@ private:
 
     std::mutex mutex_;
     sqlite3* db_;
+    std::string path_;
     sqlite3_stmt* upsert_ = nullptr;
     sqlite3_stmt* select_ = nullptr;
     std::string failure_;  ///< the first failed write of the transaction

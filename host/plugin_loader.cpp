@@ -1,39 +1,19 @@
 #include "host/plugin_loader.h"
 
 #include <dlfcn.h>
-#include <elf.h>
-#include <sys/stat.h>
+#include <link.h>
 
 #include <algorithm>
-#include <cerrno>
-#include <cstring>
-#include <fstream>
 
 #include "host/service_provider.h"
+#include "host/shared_object_check.h"
 
 namespace xtok::host {
 
 namespace {
 
-/// Why `path` cannot be a shared object, checked before dlopen so that the
-/// common mistakes get plain words rather than a loader message; "" when
-/// it may be one.
-std::string fileProblem(const std::string& path) {
-    struct stat info;
-    if (stat(path.c_str(), &info) != 0) {
-        return "plug-in " + path + " not found: " + std::strerror(errno);
-    }
-    char magic[SELFMAG] = {};
-    std::ifstream file(path, std::ios::binary);
-    if (!S_ISREG(info.st_mode) || !file.read(magic, SELFMAG) ||
-        std::memcmp(magic, ELFMAG, SELFMAG) != 0) {
-        return path + " is not a shared object";
-    }
-    return "";
-}
-
 void* loadLibrary(const std::string& path, std::string& error) {
-    error = fileProblem(path);
+    error = sharedObjectProblem(path);
     if (!error.empty()) {
         return nullptr;
     }
@@ -43,6 +23,19 @@ void* loadLibrary(const std::string& path, std::string& error) {
         error = "cannot load " + path + ": " + (why ? why : "dlopen failed");
     }
     return handle;
+}
+
+/// Whether the symbol at `address` is code: calling a data object would
+/// crash the host.
+bool isFunction(void* address) {
+    Dl_info info;
+    void* entry = nullptr;
+    if (dladdr1(address, &info, &entry, RTLD_DL_SYMENT) == 0 || !entry) {
+        return false;
+    }
+    // The type field is the same for both word sizes.
+    const unsigned type = ELF64_ST_TYPE(static_cast<const ElfW(Sym)*>(entry)->st_info);
+    return type == STT_FUNC || type == STT_GNU_IFUNC;
 }
 
 }  // namespace
@@ -76,7 +69,12 @@ std::unique_ptr<LoadedPlugin> LoadedPlugin::load(const std::string& path, Servic
 }
 
 bool LoadedPlugin::connect(std::string& error) {
-    auto entry = reinterpret_cast<void* (*)()>(dlsym(handle_, "GetInterfaceFactory"));
+    void* symbol = dlsym(handle_, "GetInterfaceFactory");
+    if (symbol && !isFunction(symbol)) {
+        error = path_ + " is not a protocol plug-in: its GetInterfaceFactory is not a function";
+        return false;
+    }
+    auto entry = reinterpret_cast<void* (*)()>(symbol);
     auto* root = entry ? static_cast<IInterfaceFactory*>(entry()) : nullptr;
     if (root) {
         module_ = static_cast<IProtModule*>(root->GetInterface("IProtModule"));

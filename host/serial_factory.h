@@ -1,6 +1,7 @@
 // "ISerialFactory": serial ports by the runtime's names.
 #pragma once
 
+#include <atomic>
 #include <mutex>
 #include <set>
 #include <string>
@@ -22,6 +23,14 @@ public:
 
     /// For the ports' own complaints.
     void notice(const std::string& text) const { notice_(text); }
+    /// A port's refusal of line settings, said as a notice and counted.
+    void refused(const std::string& text) {
+        ++refusals_;
+        notice_(text);
+    }
+    /// How many line settings were refused so far: a failed open with no
+    /// new refusal failed on the device, not on its settings.
+    int refusals() const { return refusals_; }
     /// Says `text` only the first time it is given for `key`.
     void noticeOnce(const std::string& key, const std::string& text);
 
@@ -30,6 +39,7 @@ private:
     Notice notice_;
     std::mutex mutex_;
     std::set<std::string> noticed_;
+    std::atomic<int> refusals_{0};
 };
 
 }  // namespace xtok::host

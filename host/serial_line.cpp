@@ -2,6 +2,7 @@
 
 #include <libserialport.h>
 #include <linux/serial.h>
+#include <signal.h>
 #include <sys/ioctl.h>
 #include <termios.h>
 
@@ -83,6 +84,12 @@ tcflag_t sizeFlag(int32_t bits) {
         default:
             return CS8;
     }
+}
+
+bool sameSettings(const termios& a, const termios& b) {
+    return a.c_iflag == b.c_iflag && a.c_oflag == b.c_oflag && a.c_cflag == b.c_cflag &&
+           a.c_lflag == b.c_lflag && cfgetispeed(&a) == cfgetispeed(&b) &&
+           cfgetospeed(&a) == cfgetospeed(&b) && std::memcmp(a.c_cc, b.c_cc, sizeof a.c_cc) == 0;
 }
 
 constexpr sp_parity kParities[] = {SP_PARITY_NONE, SP_PARITY_EVEN, SP_PARITY_ODD, SP_PARITY_MARK,
@@ -176,6 +183,20 @@ std::string applyLineMode(int fd, int32_t mode) {
         return systemError("the driver refused RS-485 mode");
     }
     return "";
+}
+
+void restoreTerminal(int fd, const termios& settings) {
+    termios now;
+    if (tcgetattr(fd, &now) == 0 && sameSettings(now, settings)) {
+        return;
+    }
+    sigset_t ttou;
+    sigset_t previous;
+    sigemptyset(&ttou);
+    sigaddset(&ttou, SIGTTOU);
+    pthread_sigmask(SIG_BLOCK, &ttou, &previous);
+    tcsetattr(fd, TCSANOW, &settings);
+    pthread_sigmask(SIG_SETMASK, &previous, nullptr);
 }
 
 }  // namespace xtok::host

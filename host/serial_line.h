@@ -33,4 +33,9 @@ std::string applyLineMode(int fd, int32_t mode);
 /// the device was set to before.
 std::string makeRaw(int fd);
 
+/// Puts `settings` back on a terminal, at once, unless it has them already.
+/// Safe inside a signal handler; from a background process group too, where
+/// a change would otherwise stop the program with SIGTTOU.
+void restoreTerminal(int fd, const termios& settings);
+
 }  // namespace xtok::host

@@ -58,7 +58,12 @@ int openDirectly(const std::string& device, std::string& error) {
 SerialPort::SerialPort(std::string device, SerialFactory& factory, sp_port* port, int fd)
     : device_(std::move(device)), factory_(factory), port_(port), fd_(fd) {}
 
+// At once, not after the output drains: a line held off by flow control must
+// not hang the close.
 SerialPort::~SerialPort() {
+    if (restore_) {
+        restoreTerminal(fd_, original_);
+    }
     if (port_) {
         sp_close(port_);
         sp_free_port(port_);
@@ -67,20 +72,29 @@ SerialPort::~SerialPort() {
     }
 }
 
-// libserialport is tried first; it refuses devices it cannot find in sysfs,
-// pseudo-terminals among them, and those are opened and set up directly.
+// The device's settings are read on a descriptor of its own before
+// libserialport opens it, since libserialport sets it raw as it opens. It
+// refuses devices it cannot find in sysfs, pseudo-terminals among them, and
+// those keep the direct descriptor.
 std::unique_ptr<SerialPort> SerialPort::open(const std::string& device, SerialFactory& factory,
                                              std::string& error) {
-    sp_port* port = nullptr;
-    int fd = -1;
-    if (!openWithLibserialport(device, port, fd)) {
-        fd = openDirectly(device, error);
-        if (fd < 0) {
-            return nullptr;
-        }
+    int fd = openDirectly(device, error);
+    if (fd < 0) {
+        return nullptr;
     }
-    // Adopted at once so that every failure below closes what was opened.
+    termios original{};
+    const bool known = tcgetattr(fd, &original) == 0;
+    sp_port* port = nullptr;
+    int shared = -1;
+    if (openWithLibserialport(device, port, shared)) {
+        ::close(fd);
+        fd = shared;
+    }
+    // Adopted at once so that every failure below closes what was opened,
+    // and puts back what libserialport changed.
     std::unique_ptr<SerialPort> opened(new SerialPort(device, factory, port, fd));
+    opened->original_ = original;
+    opened->restore_ = known && port;
     // Two programs on one line garble each other's frames; the advisory lock
     // is what terminal programs check, and it says "busy" where the kernel
     // would let the second open pass.
@@ -93,6 +107,7 @@ std::unique_ptr<SerialPort> SerialPort::open(const std::string& device, SerialFa
         error = std::strerror(errno);
         return nullptr;
     }
+    opened->restore_ = known;
     error = makeRaw(fd);
     return error.empty() ? std::move(opened) : nullptr;
 }
@@ -104,7 +119,7 @@ bool SerialPort::Configure(int32_t baud, int32_t parity, int32_t bits, int32_t s
         why = port_ ? applyWithLibserialport(port_, settings) : applyWithTermios(fd_, settings);
     }
     if (!why.empty()) {
-        factory_.notice(device_ + ": " + why);
+        factory_.refused(device_ + ": " + why);
         return false;
     }
     why = applyLineMode(fd_, mode);

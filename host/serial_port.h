@@ -1,6 +1,8 @@
 // One open serial device behind ISerialPort.
 #pragma once
 
+#include <termios.h>
+
 #include <array>
 #include <cstddef>
 #include <cstdint>
@@ -70,6 +72,11 @@ private:
     // devices outside sysfs); fd_ is then ours to close.
     sp_port* port_;
     int fd_;
+    // What the device was set to before it was opened here, put back at the
+    // close once changed: a terminal used as a port is a terminal again
+    // afterwards, as terminal programs leave it.
+    termios original_{};
+    bool restore_ = false;
     ReadBuffer buffer_;
 };
 

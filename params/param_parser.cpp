@@ -6,6 +6,8 @@
 #include <cerrno>
 #include <cstdlib>
 #include <limits>
+#include <string_view>
+#include <unordered_set>
 
 namespace xtok {
 
@@ -52,36 +54,82 @@ ParamParser::ParamParser(const std::string& text) : text_(text) {
     std::size_t next = text_.find(kSectionStart, start);
     text_ = next == std::string::npos ? text_.substr(start) : text_.substr(start, next - start);
     scanNodes();
+    indexEntries();
 }
 
 // Any "Node", digits and "::" in a row name a node, even inside a value: the
 // scan does not split the text into entries, and real values never take that
-// shape.
+// shape. The "::" found last is kept while it lies ahead, so that many a
+// "Node" before one far "::" does not search for it again each time.
 void ParamParser::scanNodes() {
+    std::unordered_set<int32_t> known;
     std::size_t pos = text_.find("Node");
+    std::size_t colon = 0;
+    bool colonAhead = false;
     while (pos != std::string::npos) {
-        std::size_t colon = text_.find("::", pos);
+        if (!colonAhead || colon < pos) {
+            colon = text_.find("::", pos);
+            colonAhead = true;
+        }
         if (colon == std::string::npos) {
             return;
         }
-        pos += 4;
-        std::size_t i = pos;
+        std::size_t digits = pos + 4;
+        std::size_t i = digits;
         while (i < colon && isDigit(text_[i])) {
             ++i;
         }
+        std::size_t next = digits;  // not a prefix: look again right after this "Node"
         if (i == colon) {
-            addNode(parseNodeNumber(text_, pos, colon));
-        } else {
-            colon = pos;  // not a prefix: look again right after this "Node"
+            const int32_t node = parseNodeNumber(text_, digits, colon);
+            if (known.insert(node).second) {
+                nodes_.push_back(node);
+            }
+            next = colon;
         }
-        pos = text_.find("Node", colon);
+        pos = text_.find("Node", next);
     }
 }
 
-void ParamParser::addNode(int32_t node) {
-    if (std::find(nodes_.begin(), nodes_.end(), node) == nodes_.end()) {
-        nodes_.push_back(node);
+// An entry begins where the text or a run of non-blanks begins, and its name
+// runs to the run's first "=".
+void ParamParser::indexEntries() {
+    for (std::size_t p = 0; p < text_.size(); ++p) {
+        if (isWhite(text_[p]) || (p > 0 && !isWhite(text_[p - 1]))) {
+            continue;
+        }
+        std::size_t end = p;
+        while (end < text_.size() && !isWhite(text_[end]) && text_[end] != '=') {
+            ++end;
+        }
+        if (end < text_.size() && text_[end] == '=') {
+            entries_.push_back({p, end - p});
+        }
+        p = end;
     }
+    auto name = [this](const Entry& e) {
+        return std::string_view(text_).substr(e.start, e.length);
+    };
+    std::sort(entries_.begin(), entries_.end(), [&](const Entry& a, const Entry& b) {
+        const int order = name(a).compare(name(b));
+        return order != 0 ? order < 0 : a.start < b.start;
+    });
+}
+
+// A name with a blank or "=" may still match across entries, as the scan
+// finds it; every other name is one entry's whole name.
+std::size_t ParamParser::valueStart(const std::string& name) const {
+    if (std::any_of(name.begin(), name.end(), [](char c) { return c == '=' || isWhite(c); })) {
+        return scannedValueStart(name);
+    }
+    const std::string_view text(text_);
+    auto first = std::lower_bound(
+        entries_.begin(), entries_.end(), name,
+        [&](const Entry& e, const std::string& n) { return text.substr(e.start, e.length) < n; });
+    if (first == entries_.end() || text.substr(first->start, first->length) != name) {
+        return std::string::npos;
+    }
+    return first->start + first->length + 1;
 }
 
 int32_t ParamParser::nodeAt(int32_t index) const {
@@ -93,16 +141,20 @@ int32_t ParamParser::nodeAt(int32_t index) const {
 
 // A name only counts where an entry can begin, so "xport=" or "Node3::port="
 // never answer for "port".
-const std::string* ParamParser::findValue(const std::string& name) {
+std::size_t ParamParser::scannedValueStart(const std::string& name) const {
     const std::string key = name + "=";
     std::size_t p = text_.find(key);
     while (p != std::string::npos && p != 0 && !isWhite(text_[p - 1])) {
         p = text_.find(key, p + 1);
     }
-    if (p == std::string::npos) {
+    return p == std::string::npos ? p : p + key.size();
+}
+
+const std::string* ParamParser::findValue(const std::string& name) {
+    const std::size_t start = valueStart(name);
+    if (start == std::string::npos) {
         return nullptr;
     }
-    std::size_t start = p + key.size();
     std::size_t end = start;
     while (end < text_.size() && !isWhite(text_[end])) {
         ++end;

@@ -1,8 +1,9 @@
 // The reader of the configuration text a runtime hands to a protocol.
 //
 // The text is "name=value" entries separated by white space, after a
-// "CfgVer=1" marker; "NodeN::name=value" entries belong to node N. Every
-// lookup scans the text: configurations are short and read once.
+// "CfgVer=1" marker; "NodeN::name=value" entries belong to node N. The
+// entries are indexed once by name, so that a configuration of many node
+// sections, with a lookup per node, is read in time linear in its length.
 #pragma once
 
 #include <cstdint>
@@ -52,12 +53,25 @@ public:
     const std::string& text() const { return text_; }
 
 private:
+    /// Where an entry starts: its name is text_[start, start + length).
+    struct Entry {
+        std::size_t start;
+        std::size_t length;
+    };
+
     void scanNodes();
-    void addNode(int32_t node);
+    void indexEntries();
+    /// Where the value of the first entry named `name` begins, or npos.
+    std::size_t valueStart(const std::string& name) const;
+    /// The same by scanning the text, for names the index cannot hold.
+    std::size_t scannedValueStart(const std::string& name) const;
 
     std::string text_;
     std::string lastValue_;
     std::vector<int32_t> nodes_;
+    /// By name, then by position: the first of equal names is the entry
+    /// that counts.
+    std::vector<Entry> entries_;
     bool formatKnown_ = false;
 };
 

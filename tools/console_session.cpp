@@ -28,6 +28,9 @@ const char* const kHostHelp =
     "                             show received tokens (time, text, hex) and acknowledge\n"
     "                             them, until Ctrl-C, N tokens or the time-out\n"
     "  settings                   each setting: active and where from, staged, retained\n"
+    "  reset-retained             forget the settings SP_Done retained for this\n"
+    "                             instance and start the plug-in anew with the\n"
+    "                             configured ones\n"
     "  help                       this text and the plug-in's console commands\n"
     "  help datatypes             the data types of a tag address\n"
     "  help memorytypes           the plug-in's memory types\n"
@@ -93,11 +96,30 @@ ConsoleSession::ConsoleSession(PluginSession& session, const PluginDescription& 
 bool ConsoleSession::run(LineInput& input) {
     bool allGood = true;
     std::string line;
+    showMessages();
     while (!quit_ && input.next(line)) {
         allGood = execute(line) && allGood;
+        showMessages();
         out_.flush();
     }
     return allGood;
+}
+
+// As the host's notices are: a line on standard error, or an event among
+// the results under --json.
+void ConsoleSession::showMessages() {
+    for (const SessionMessage& message : session_.takeMessages()) {
+        if (json_) {
+            out_ << JsonLine()
+                        .text("event", message.warning ? "warning" : "notice")
+                        .text("text", message.text)
+                        .str()
+                 << '\n';
+        } else {
+            err_ << "xtok-host: " << (message.warning ? "warning: " : "") << message.text
+                 << std::endl;
+        }
+    }
 }
 
 bool ConsoleSession::execute(const std::string& raw) {
@@ -122,6 +144,9 @@ bool ConsoleSession::execute(const std::string& raw) {
     }
     if (word == "settings") {
         return settings(line);
+    }
+    if (word == "reset-retained") {
+        return resetRetained(line);
     }
     // As typed but for the margins: "put" sends the rest of its line,
     // trailing blanks included.
@@ -262,8 +287,7 @@ bool ConsoleSession::watch(const std::string& line, const std::vector<std::strin
 }
 
 bool ConsoleSession::settings(const std::string& line) {
-    char active[256] = {};
-    session_.protocol().GetSerialSettings(active, sizeof active - 1);
+    const std::string active = session_.serialSettings();
     report(JsonLine()
                .text("command", line)
                .flag("ok", true)
@@ -271,6 +295,16 @@ bool ConsoleSession::settings(const std::string& line) {
                .raw("settings", settingsJson(session_.settings()))
                .str(),
            settingsText(session_.settings(), active));
+    return true;
+}
+
+bool ConsoleSession::resetRetained(const std::string& line) {
+    std::string cleared;
+    std::string error;
+    if (!session_.resetRetained(cleared, error)) {
+        return fail(line, error);
+    }
+    report(JsonLine().text("command", line).flag("ok", true).text("reply", cleared).str(), cleared);
     return true;
 }
 

@@ -25,6 +25,8 @@ public:
     /// One line; false when it failed.
     bool execute(const std::string& line);
     bool quitRequested() const { return quit_; }
+    /// Shows what the session has to say beside the commands' results.
+    void showMessages();
 
 private:
     bool help(const std::string& line, const std::vector<std::string>& words);
@@ -33,6 +35,7 @@ private:
     bool tagWrite(const std::string& line, const std::string& address, const std::string& value);
     bool watch(const std::string& line, const std::vector<std::string>& words);
     bool settings(const std::string& line);
+    bool resetRetained(const std::string& line);
     bool passOn(const std::string& line);
 
     bool fail(const std::string& line, const std::string& error);

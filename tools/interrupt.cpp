@@ -6,19 +6,24 @@
 
 #include <cerrno>
 
+#include "tools/terminal_state.h"
+
 namespace xtok::tools {
 
 namespace {
 
 volatile sig_atomic_t requested = 0;
+volatile sig_atomic_t terminating = 0;
 
 void onSignal(int number) {
     if (requested) {
+        restoreTerminalSettings();
         signal(number, SIG_DFL);
         raise(number);
         return;
     }
     requested = 1;
+    terminating = terminating || number == SIGTERM;
 }
 
 }  // namespace
@@ -34,6 +39,10 @@ void catchInterrupts() {
 
 bool interruptRequested() {
     return requested != 0;
+}
+
+bool terminationRequested() {
+    return terminating != 0;
 }
 
 bool takeInterrupt() {

@@ -1,6 +1,8 @@
 // Ctrl-C as a request, not a kill: the demo and "watch" end cleanly on it,
-// the console drops the line being typed. A second Ctrl-C before the first
-// was seen ends the program the ordinary way, in case something hangs.
+// the console drops the line being typed. SIGTERM asks the same and ends
+// the console too. A second signal before the first was seen ends the
+// program the ordinary way, in case something hangs, after putting the
+// terminal's settings back.
 #pragma once
 
 #include <signal.h>
@@ -12,6 +14,8 @@ namespace xtok::tools {
 /// SIGINT and SIGTERM set the request; system calls are interrupted by it.
 void catchInterrupts();
 bool interruptRequested();
+/// Whether SIGTERM came: the session ends, whatever it was doing.
+bool terminationRequested();
 /// Takes the request back: true when there was one.
 bool takeInterrupt();
 /// Waits `pause`, or less when an interrupt comes; true when one came.

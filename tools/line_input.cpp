@@ -33,7 +33,8 @@ class ScriptInput final : public LineInput {
 public:
     bool next(std::string& line) override {
         // Ctrl-C on a script ends it, the way it ends any command.
-        return !interruptRequested() && static_cast<bool>(std::getline(std::cin, line));
+        return !interruptRequested() && !terminationRequested() &&
+               static_cast<bool>(std::getline(std::cin, line));
     }
 };
 
@@ -41,7 +42,7 @@ class TextInput final : public LineInput {
 public:
     explicit TextInput(const std::string& text) : lines_(splitCommands(text)) {}
     bool next(std::string& line) override {
-        if (next_ >= lines_.size() || interruptRequested()) {
+        if (next_ >= lines_.size() || interruptRequested() || terminationRequested()) {
             return false;
         }
         line = lines_[next_++];
@@ -83,6 +84,9 @@ public:
         while (!done_) {
             pollfd ready{STDIN_FILENO, POLLIN, 0};
             int count = poll(&ready, 1, -1);
+            if (count < 0 && errno == EINTR && terminationRequested()) {
+                break;
+            }
             if (count < 0 && errno == EINTR) {
                 if (takeInterrupt()) {
                     abandonLine();

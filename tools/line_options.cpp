@@ -3,23 +3,17 @@
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <cctype>
-#include <cerrno>
-#include <cstring>
-#include <fstream>
 #include <utility>
 
 #include "tools/closest_word.h"
 #include "tools/config_check.h"
+#include "tools/config_file.h"
 #include "tools/config_text.h"
 #include "tools/settings_model.h"
 
 namespace xtok::tools {
 
 namespace {
-
-// A configuration file holds a few hundred bytes; the limit keeps a wrong
-// path (a device, /dev/zero) from filling memory.
-constexpr std::size_t kMaxConfigFile = 1u << 20;
 
 // Leads a command line may leave out: a bare "prefix" is the receive side's,
 // a bare "queue size" the token queue's.
@@ -93,17 +87,7 @@ bool readConfigText(const std::string& option, std::string& text, std::string& e
         text = option;
         return true;
     }
-    const std::string path = option.substr(1);
-    std::ifstream file(path, std::ios::binary);
-    text.assign(kMaxConfigFile + 1, '\0');
-    file.read(&text[0], static_cast<std::streamsize>(text.size()));
-    text.resize(file ? text.size() : static_cast<std::size_t>(file.gcount()));
-    if (!file.eof() || text.size() > kMaxConfigFile) {
-        error = "cannot read the configuration file " + path + ": " +
-                (text.size() > kMaxConfigFile ? "larger than 1 MiB" : std::strerror(errno));
-        return false;
-    }
-    return true;
+    return readConfigFile(option.substr(1), text, error);
 }
 
 /// The editor's defaults of the mandatory keys, but for the port, which

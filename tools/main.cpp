@@ -14,6 +14,7 @@
 #include "tools/plugin_path.h"
 #include "tools/ports.h"
 #include "tools/run_command.h"
+#include "tools/terminal_state.h"
 #include "tools/version.h"
 #include "xtokline/text.h"
 
@@ -85,9 +86,11 @@ CLI::App* addRun(CLI::App& app, RunOptions& run, const PluginDescription& descri
         "fill the line; options set single keys.");
     command->footer(
         "Console: tag read ADDRESS, tag write ADDRESS VALUE, watch [--count N] [--timeout S], "
-        "settings, help [datatypes|memorytypes], quit; any other line goes to the plug-in's own "
-        "console. Exit status 1 when any command failed.");
+        "settings, reset-retained, help [datatypes|memorytypes], quit; any other line goes to "
+        "the plug-in's own console. Exit status 1 when any command failed.");
     addLineOptions(*command, run.line, description);
+    command->add_flag("--reset-retained", run.resetRetained,
+                      "Forget the settings SP_Done retained for the instance before starting");
     command->add_option(
         "--exec", run.exec,
         "Commands separated by ';' (\\; for one inside a value) instead of standard input");
@@ -103,6 +106,7 @@ int startRun(const CLI::App& command, RunOptions& run, const PluginAtHand& plugi
     run.line.pluginPath = plugin.path;
     SessionOptions session;
     std::vector<std::string> faults = lineFaults(command, run.line, plugin.description, session);
+    session.resetRetained = run.resetRetained;
     return runConsole(run, session, plugin.description, faults, std::cout, std::cerr);
 }
 
@@ -129,6 +133,7 @@ void addVersions(CLI::App& app, const PluginAtHand& plugin) {
 }  // namespace
 
 int main(int argc, char** argv) {
+    keepTerminalSettings();
     const bool json = std::find_if(argv + 1, argv + argc, [](const char* a) {
                           return std::strcmp(a, "--json") == 0;
                       }) != argv + argc;

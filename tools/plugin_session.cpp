@@ -3,9 +3,14 @@
 #include "host/permanent_storage.h"
 
 #include <cctype>
+#include <cstring>
 #include <mutex>
 
+#include "protocol/settings.h"
 #include "tools/interrupt.h"
+#include "tools/notice_relay.h"
+#include "tools/retained_settings.h"
+#include "xtokline/text.h"
 
 namespace xtok::tools {
 
@@ -49,51 +54,6 @@ bool replyTellsFailure(const std::string& word, const std::string& reply) {
 
 }  // namespace
 
-/// Holds the host's notices while the session starts, so that the reason a
-/// port would not open becomes part of the one error line; passes them on
-/// once the session runs.
-class NoticeRelay {
-public:
-    explicit NoticeRelay(host::Notice out) : out_(std::move(out)) {}
-
-    void say(const std::string& text) {
-        std::unique_lock<std::mutex> lock(mutex_);
-        if (holding_) {
-            held_.push_back(text);
-            return;
-        }
-        lock.unlock();
-        if (out_) {
-            out_(text);
-        }
-    }
-    std::string held() const {
-        std::lock_guard<std::mutex> lock(mutex_);
-        std::string joined;
-        for (const std::string& line : held_) {
-            joined += (joined.empty() ? "" : "; ") + line;
-        }
-        return joined;
-    }
-    void passOn() {
-        std::vector<std::string> held;
-        {
-            std::lock_guard<std::mutex> lock(mutex_);
-            holding_ = false;
-            held.swap(held_);
-        }
-        for (const std::string& line : held) {
-            say(line);
-        }
-    }
-
-private:
-    host::Notice out_;
-    mutable std::mutex mutex_;
-    bool holding_ = true;
-    std::vector<std::string> held_;
-};
-
 void PluginSession::TagDeleter::operator()(ITag* tag) const {
     tag->Destroy(1);
 }
@@ -101,34 +61,20 @@ void PluginSession::TagDeleter::operator()(ITag* tag) const {
 std::unique_ptr<PluginSession> PluginSession::start(const SessionOptions& options,
                                                     std::string& error) {
     std::unique_ptr<PluginSession> session(new PluginSession);
-    if (!session->load(options, error)) {
+    session->config_ = options.config;
+    session->instanceName_ = options.instanceName;
+    std::string cleared;
+    if (!session->load(options, error) ||
+        (options.resetRetained && !session->clearRetained(cleared, error))) {
         return nullptr;
     }
-    IProtocol7& protocol = *session->protocol_;
-    if (!options.instanceName.empty()) {
-        protocol.SetInstanceName(options.instanceName.c_str());
+    if (!cleared.empty()) {
+        session->say(false, cleared);
     }
-    if (!protocol.Configure(options.config.c_str())) {
-        error = "bad configuration: " + session->lastError();
-        return nullptr;
-    }
-    bool started = false;
-    {
-        InterruptsBlocked forTheMainThread;  // the receive task starts here
-        started = protocol.Start();
-    }
-    if (!started) {
-        // The host's notice says why the port would not open; the
-        // plug-in only knows that it did not.
-        std::string why = session->relay_->held();
-        error = "cannot start: " + (why.empty() ? session->lastError() : why);
+    if (!session->configureAndStart(error)) {
         return nullptr;
     }
     session->relay_->passOn();
-    session->settings_.configured(options.config);
-    if (host::PermanentStorage* storage = session->host_->permanentStorage()) {
-        session->settings_.retainedAtStart(*storage, protocol.GetInstanceName());
-    }
     return session;
 }
 
@@ -144,11 +90,156 @@ bool PluginSession::load(const SessionOptions& options, std::string& error) {
         return false;
     }
     plugin_ = host::LoadedPlugin::load(options.pluginPath, *host_, error);
-    if (!plugin_) {
+    return plugin_ && (protocol_ = newProtocol(error)) != nullptr;
+}
+
+IProtocol7* PluginSession::newProtocol(std::string& error) {
+    IProtocol7* protocol = plugin_->createProtocol("XTOK", error);
+    if (protocol && !instanceName_.empty()) {
+        protocol->SetInstanceName(instanceName_.c_str());
+    }
+    return protocol;
+}
+
+bool PluginSession::configureAndStart(std::string& error) {
+    IProtocol7& protocol = *protocol_;
+    if (!protocol.Configure(config_.c_str())) {
+        error = "bad configuration: " + lastError();
         return false;
     }
-    protocol_ = plugin_->createProtocol("XTOK", error);
-    return protocol_ != nullptr;
+    const std::string configured = serialSettings();
+    const int refusals = host_->serialFactory().refusals();
+    bool started = false;
+    {
+        InterruptsBlocked forTheMainThread;  // the receive task starts here
+        started = protocol.Start();
+    }
+    // The host's notice says why the port would not open; the plug-in only
+    // knows that it did not.
+    const std::string held = relay_->takeHeld();
+    const std::string why = held.empty() ? lastError() : held;
+    if (!started && !startDisconnected(configured, refusals, why)) {
+        error = "cannot start: " + why;
+        return false;
+    }
+    settings_ = SettingsModel();
+    settings_.configured(config_);
+    if (host::PermanentStorage* storage = host_->permanentStorage()) {
+        settings_.retainedAtStart(*storage, protocol.GetInstanceName());
+        const std::string warning =
+            RetainedSettings(*storage, protocol.GetInstanceName()).queueSizeWarning();
+        if (!warning.empty()) {
+            say(true, warning);
+        }
+    }
+    return true;
+}
+
+// Settings retained by SP_Done that the port refuses would otherwise keep the
+// operator from ever starting again, and from the SP_ tags that could change
+// them.
+bool PluginSession::startDisconnected(const std::string& configured, int refusalsBefore,
+                                      const std::string& why) {
+    host::PermanentStorage* storage = host_->permanentStorage();
+    std::string port;
+    LineSettings line;
+    if (!storage || host_->serialFactory().refusals() == refusalsBefore ||
+        !parseSerialSettings(configured, port, line)) {
+        return false;
+    }
+    RetainedSettings retained(*storage, protocol_->GetInstanceName());
+    const std::string refused = retained.lineDifferences(line);
+    if (refused.empty() || !portTakes(port, line) || !startWithoutPort()) {
+        return false;
+    }
+    say(true, "the port refused line settings that SP_Done retained: " + refused + " [" + why +
+                  "]. They are kept " + retained.where() +
+                  "; started disconnected. reset-retained, or run --reset-retained, clears "
+                  "them; or set others with SP_ tags and SP_Done, then connect ON");
+    return true;
+}
+
+// Whether the configured settings are the port's to refuse as well: then the
+// retained ones are not to blame.
+bool PluginSession::portTakes(const std::string& port, const LineSettings& line) {
+    host::SerialFactory& ports = host_->serialFactory();
+    ISerialPort* opened = ports.Open(port.c_str());
+    const bool taken =
+        opened && opened->Configure(line.baud, line.parity, line.bits, line.stop, line.mode);
+    if (opened) {
+        ports.Close(opened);
+    }
+    relay_->takeHeld();  // said by the start error, if it comes to that
+    return taken;
+}
+
+// autoConnect=false as the section's first entry wins over any later one.
+bool PluginSession::startWithoutPort() {
+    const std::string marker = "CfgVer=1";
+    const std::size_t section = config_.find(marker);
+    if (section == std::string::npos) {
+        return false;
+    }
+    std::string disconnected = config_;
+    disconnected.insert(section + marker.size(), " autoConnect=false ");
+    InterruptsBlocked forTheMainThread;
+    return protocol_->Configure(disconnected.c_str()) && protocol_->Start();
+}
+
+bool PluginSession::clearRetained(std::string& report, std::string& error) {
+    host::PermanentStorage* storage = host_->permanentStorage();
+    if (!storage) {
+        error = "no settings are retained in this session";
+        return false;
+    }
+    return RetainedSettings(*storage, protocol_->GetInstanceName()).clear(report, error);
+}
+
+bool PluginSession::resetRetained(std::string& report, std::string& error) {
+    if (!clearRetained(report, error)) {
+        return false;
+    }
+    // The protocol keeps what it read at its first Start for its whole life:
+    // only a new one reads the cleared file. Should none be made, the old
+    // one runs on.
+    IProtocol7* fresh = newProtocol(error);
+    if (!fresh) {
+        error = report + "; but " + error;
+        return false;
+    }
+    tags_.clear();
+    plugin_->destroyProtocol(protocol_);
+    protocol_ = fresh;
+    std::string why;
+    if (!configureAndStart(why)) {
+        // The session goes on: connect ON tries the port again.
+        if (!startWithoutPort()) {
+            error = report + "; but " + why;
+            return false;
+        }
+        report += "; the plug-in started anew, disconnected (" + why + ")";
+        return true;
+    }
+    report += "; the plug-in started anew on " + serialSettings();
+    return true;
+}
+
+// The port's name comes from the configuration and may be long; the rest of
+// the text is a few numbers and names.
+std::string PluginSession::serialSettings() {
+    std::vector<char> text(config_.size() + 64, '\0');
+    protocol_->GetSerialSettings(text.data(), static_cast<int32_t>(text.size() - 1));
+    return text.data();
+}
+
+void PluginSession::say(bool warning, const std::string& text) {
+    messages_.push_back({warning, text});
+}
+
+std::vector<SessionMessage> PluginSession::takeMessages() {
+    std::vector<SessionMessage> messages;
+    messages.swap(messages_);
+    return messages;
 }
 
 PluginSession::~PluginSession() {
@@ -253,8 +344,31 @@ bool PluginSession::write(const std::string& address, const std::string& text, s
     }
     if (written && !kept.empty()) {
         error = address + " written, but its " + kept;
+    } else {
+        warnAboutQueueSize(address);
     }
     return written && kept.empty();
+}
+
+// The plug-in takes any queue size; the project editor would not have. The
+// value is read back as the plug-in holds it, whatever type wrote it.
+void PluginSession::warnAboutQueueSize(const std::string& address) {
+    const Setting& row = kSettings[kTokenQueueSize];
+    std::vector<std::string> fields;
+    splitTrimmed(address, '?', fields);
+    TagValue value;
+    std::string error;
+    if (fields.size() < 2 || fields[1] != row.memoryType ||
+        !read(std::string("0?") + row.memoryType + "?unsignedInt", value, error) ||
+        value.bytes.size() < sizeof(int32_t)) {
+        return;
+    }
+    int32_t size = 0;
+    std::memcpy(&size, value.bytes.data(), sizeof size);
+    const std::string warning = queueSizeWarning(size, row.memoryType);
+    if (!warning.empty()) {
+        say(true, warning);
+    }
 }
 
 std::string PluginSession::command(const std::string& line, bool& ok) {

@@ -13,6 +13,7 @@
 #include "host/service_provider.h"
 #include "tools/settings_model.h"
 #include "tools/tag_values.h"
+#include "xtokline/constants.h"
 
 namespace xtok::tools {
 
@@ -24,9 +25,19 @@ struct SessionOptions {
     bool permanentStorage = true;
     std::string statePath;     // "" for the host's default file
     std::string instanceName;  // "" for the protocol's own name
+    /// Forget the instance's retained settings before the start.
+    bool resetRetained = false;
     /// Host notices after a successful start; during it they become part of
     /// the start error instead.
     host::Notice notice = host::printNotice;
+};
+
+/// What the session has to tell beside the results of commands: what a reset
+/// cleared, settings a port refused, values outside the project editor's
+/// range. Warnings are not failures.
+struct SessionMessage {
+    bool warning;
+    std::string text;
 };
 
 /// A tag's value as read.
@@ -49,13 +60,17 @@ class NoticeRelay;
 class PluginSession {
 public:
     /// Null with one line in `error` when any step fails: the state file, the
-    /// plug-in, the configuration, or the port.
+    /// plug-in, the configuration, or the port. When the port refuses line
+    /// settings retained in the state file, the session starts all the same,
+    /// disconnected, and a message says which and how to clear them.
     static std::unique_ptr<PluginSession> start(const SessionOptions& options, std::string& error);
     ~PluginSession();
     PluginSession(const PluginSession&) = delete;
     PluginSession& operator=(const PluginSession&) = delete;
 
     IProtocol7& protocol() { return *protocol_; }
+    /// The protocol's line as GetSerialSettings tells it, whole.
+    std::string serialSettings();
 
     /// A tag by its address, made once and kept. Null with `error` set.
     ITag* tag(const std::string& address, std::string& error);
@@ -73,9 +88,32 @@ public:
     /// The settings as this session has changed them (settings_tracking.cpp).
     const SettingsModel& settings() const { return settings_; }
 
+    /// Forgets the instance's retained settings and starts the plug-in's
+    /// protocol anew, so that the configured ones are active. `report` says
+    /// what was cleared and how the protocol started. False with `error`
+    /// when the settings could not be cleared or the protocol not started.
+    bool resetRetained(std::string& report, std::string& error);
+
+    /// The messages since the last call.
+    std::vector<SessionMessage> takeMessages();
+
 private:
     PluginSession() = default;
     bool load(const SessionOptions& options, std::string& error);
+    /// A new protocol, named; null with `error`.
+    IProtocol7* newProtocol(std::string& error);
+    bool configureAndStart(std::string& error);
+    /// Starts again without opening the port, when the port refused settings
+    /// retained in the state file: false when it did not, or `why` had
+    /// another cause.
+    bool startDisconnected(const std::string& configured, int refusalsBefore,
+                           const std::string& why);
+    /// Configures again with autoConnect=false and starts.
+    bool startWithoutPort();
+    bool portTakes(const std::string& port, const LineSettings& line);
+    bool clearRetained(std::string& report, std::string& error);
+    void say(bool warning, const std::string& text);
+    void warnAboutQueueSize(const std::string& address);
     bool readBytes(ITag& tag, std::vector<uint8_t>& bytes, std::string& error);
     std::string lastError();
     struct ErrorRecord {
@@ -99,6 +137,10 @@ private:
     struct TagDeleter {
         void operator()(ITag* tag) const;
     };
+
+    std::string config_;
+    std::string instanceName_;
+    std::vector<SessionMessage> messages_;
 
     // Declared in the order of building; destroyed the other way round.
     std::shared_ptr<NoticeRelay> relay_;

@@ -18,8 +18,7 @@ constexpr int kUsageError = 2;
 
 /// Which device, plug-in and state file this console works with.
 void banner(PluginSession& started, const SessionOptions& session, std::ostream& out) {
-    char line[256] = {};
-    started.protocol().GetSerialSettings(line, sizeof line - 1);
+    const std::string line = started.serialSettings();
     const std::string* port = ConfigText(session.config).find(kPortKey);
     std::string device;
     std::string unused;

@@ -13,6 +13,7 @@ struct RunOptions {
     LineOptions line;
     std::string exec;  // "cmd; cmd" instead of standard input
     bool json = false;
+    bool resetRetained = false;
 };
 
 /// Starts `session` unless there are `faults` (lineFaults'), then runs the

@@ -8,6 +8,7 @@
 #include <fstream>
 #include <string>
 #include <thread>
+#include <vector>
 
 #include "tests/host/temp_dir.h"
 
@@ -55,6 +56,19 @@ TEST_F(Storage, KeepsEachTypeAcrossReopening) {
     for (const char* key : {"baud", "min", "on", "off", "prefix", "empty", "long"}) {
         EXPECT_TRUE(storage->IsStored("XTOK", key)) << key;
     }
+    // A section is listed for people and cleared alone.
+    std::vector<StoredEntry> listed;
+    std::string error;
+    ASSERT_TRUE(storage->list("XTOK", listed, error)) << error;
+    std::string shown;
+    for (const StoredEntry& entry : listed) {
+        shown += entry.key + "=" + (entry.key == "long" ? "..." : entry.shown) + " ";
+    }
+    EXPECT_EQ(shown,
+              "baud=9600 empty=\"\" long=... min=-2147483648 off=false on=true prefix=\"02\" ");
+    ASSERT_TRUE(storage->clear("XTOK", error)) << error;
+    EXPECT_FALSE(storage->IsStored("XTOK", "baud"));
+    EXPECT_TRUE(storage->IsStored("other", "prefix"));
 }
 
 TEST_F(Storage, ReadTextToNeedsRoomForTheZero) {

@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <chrono>
 #include <string>
 #include <vector>
 
@@ -46,6 +47,10 @@ TEST(ParamParser, FindsEntriesWhereAnEntryCanStartByThePrefixRules) {
               "0 1,0 4,");
     // Bytes above 0x7F are not blanks.
     EXPECT_EQ(lookup("CfgVer=1 \xA0p=1 p=x\xA0y z", "p", -1, 0), "0 x\xA0y,");
+    // A name holding "=" or a blank matches across what the others see as entries.
+    EXPECT_EQ(lookup("CfgVer=1 a=b=c", "a=b", -1, 0) + lookup("CfgVer=1 x=1 y=2", "x=1 y", -1, 0) +
+                  lookup("CfgVer=1 ==v =w", "", -1, 0),
+              "0 c,0 2,0 =v,");
     const char* flat = "CfgVer=1 port=com1";
     const char* nodes = "CfgVer=1 model=1 Node2::model=5 Node7::x=0";
     EXPECT_EQ(lookup(flat, "port", -1, kDep) + lookup(flat, "gap", -1, 0) +
@@ -58,6 +63,24 @@ TEST(ParamParser, FindsEntriesWhereAnEntryCanStartByThePrefixRules) {
     EXPECT_EQ(lookup(nodes, "model", -1, kDep) + lookup(nodes, "gap", -1, kDep) +
                   lookup(nodes, "model", -1, kInd),
               "5 -,1 -,0 1,");
+}
+
+// A lookup per node, as Configure makes, finds each node's first entry
+// among many (bench/ times a hundred thousand).
+TEST(ParamParser, ReadsManyNodes) {
+    const int32_t count = 300;
+    std::string text = "CfgVer=1 model=1";
+    for (int32_t i = count - 1; i >= 0; --i) {
+        text += " Node" + std::to_string(i) + "::model=" + std::to_string(i % 7) + " NodeX::";
+    }
+    ParamParser parser(text + " Node5::model=9");
+    ASSERT_EQ(parser.nodeCount(), count);
+    for (int32_t i = 0; i < count; ++i) {
+        std::string model;
+        const int32_t node = parser.nodeAt(i);
+        ASSERT_EQ(parser.lookup("model", node, model, 0), PARAM_OK);
+        ASSERT_EQ(model, std::to_string(node % 7)) << node;
+    }
 }
 
 // Reads an int, or a bool for "flag", over preset outputs: "ok|failed

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 #include <sys/file.h>
 #include <sys/stat.h>
+#include <termios.h>
 #include <unistd.h>
 
 #include <fstream>
@@ -12,6 +13,7 @@
 
 #include "host/permanent_storage.h"
 #include "tests/host/temp_dir.h"
+#include "tests/host/terminal_settings.h"
 #include "tests/tools/subprocess.h"
 #include "tools/pty_pair.h"
 #include "tools/simulated_device.h"
@@ -141,6 +143,22 @@ TEST_F(Session, AKillDuringSpDoneLeavesTheOldSetOrTheNew) {
     }
 }
 
+// While another program holds the state file, what must be retained fails
+// and says why; what retains nothing goes on as usual.
+TEST_F(Session, ALockedStateFileFailsOnlyWhatItMustKeep) {
+    std::string error;
+    auto holder = host::PermanentStorage::open(dir_.file("retained.sqlite3"), error);
+    ASSERT_TRUE(holder && holder->begin(error) && holder->WriteInt("XTOK", "gap", 1)) << error;
+    Finished done = runTool(run({"--exec",
+                                 "get_stat; tag write 0?SP_Gap?unsignedInt 5; "
+                                 "tag write 0?SP_Done?boolean 1; tag read 0?SP_Gap?unsignedInt"}));
+    EXPECT_EQ(done.status, 1);
+    EXPECT_EQ(done.out, "Connected\nok\n5\n");
+    EXPECT_EQ(done.err,
+              "error: 0?SP_Done?boolean written, but its settings are not retained: database "
+              "is locked\n");
+}
+
 // SP_Done keeps the settings in the state file: the next run starts with them.
 TEST_F(Session, RetainedSettingsSurviveARestart) {
     Finished done = runTool(run({"--exec",
@@ -150,6 +168,44 @@ TEST_F(Session, RetainedSettingsSurviveARestart) {
     done =
         runTool(run({"--exec", "tag read 0?SP_Baud?unsignedInt; tag read 0?SP_RxSuffix?string-8"}));
     EXPECT_EQ(done.out, "19200\n\"0D0A\"\n") << done.err;
+}
+
+// Line settings retained in the state file that the port refuses do not
+// lock the operator out: the run starts disconnected and says which they are
+// and how to clear them; reset-retained and --reset-retained clear them.
+TEST_F(Session, RefusedRetainedSettingsStartDisconnectedUntilCleared) {
+    const std::string state = dir_.file("retained.sqlite3");
+    auto retain = [&] {
+        std::string error;
+        auto storage = host::PermanentStorage::open(state, error);
+        ASSERT_NE(storage, nullptr) << error;
+        storage->WriteInt("XTOK", "baud", 14400);  // no terminal has it
+        storage->WriteInt("XTOK", "token_queue_size", 0);
+    };
+    const std::string cleared = "cleared the settings retained in " + state +
+                                " for instance XTOK: baud=14400 token_queue_size=0";
+    // A port name longer than any fixed buffer for the settings text.
+    const std::string longPort = dir_.file(std::string(200, 'd')) + "/" + std::string(100, 'p');
+    ASSERT_EQ(mkdir(dir_.file(std::string(200, 'd')).c_str(), 0700), 0);
+    ASSERT_EQ(symlink(line_->slavePath().c_str(), longPort.c_str()), 0);
+    retain();
+    std::vector<std::string> arguments =
+        run({"--exec", "get_stat; reset-retained; get_stat; tag read 0?SP_Baud?unsignedInt"});
+    arguments[3] = configFor(longPort);
+    Finished done = runTool(arguments);
+    EXPECT_EQ(done.status, 0) << done.err;
+    EXPECT_EQ(done.out, "Disconnected\n" + cleared + "; the plug-in started anew on " + longPort +
+                            ",9600,none,8,1,RS-232\nConnected\n9600\n");
+    const std::string reported[] = {
+        "baud 14400 (configured 9600)", "kept in " + state + " for instance XTOK",
+        "started disconnected. reset-retained", "the retained token_queue_size 0"};
+    for (const std::string& said : reported) {
+        EXPECT_NE(done.err.find(said), std::string::npos) << said << " in " << done.err;
+    }
+    retain();
+    done = runTool(run({"--reset-retained", "--exec", "get_stat"}));
+    EXPECT_EQ(done.out, "Connected\n");
+    EXPECT_EQ(done.err, "xtok-host: " + cleared + "\n");
 }
 
 TEST_F(Session, CtrlCEndsAWatchAndTheScriptGoesOn) {
@@ -293,6 +349,81 @@ TEST_F(Session, AScriptOnStandardInputGoesOnAfterAFailureAndSaysSoAtTheEnd) {
                                   "error: set_hexToken: wrong value"}));
 }
 
+/// A pseudo-terminal as a person's terminal: cooked, as a shell leaves it.
+class Terminal {
+public:
+    Terminal() {
+        master_ = posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
+        if (master_ >= 0 && grantpt(master_) == 0 && unlockpt(master_) == 0) {
+            slave_ = ptsname(master_);
+            held_ = open(slave_.c_str(), O_RDWR | O_NOCTTY | O_CLOEXEC);
+        }
+    }
+    ~Terminal() {
+        close(held_);
+        close(master_);
+    }
+    const std::string& slave() const { return slave_; }
+    std::string settings() const {
+        termios t{};
+        return tcgetattr(held_, &t) == 0 ? host::test::settingsText(t) : "none";
+    }
+    bool type(const std::string& text) {
+        return write(master_, text.data(), text.size()) == static_cast<ssize_t>(text.size());
+    }
+
+private:
+    int master_ = -1;
+    int held_ = -1;
+    std::string slave_;
+};
+
+struct TerminalCase {
+    const char* what;
+    bool portOnTerminal;      // the configured port is /dev/tty, the run's own terminal
+    const char* script;       // --exec, or null for a session typed at the prompt
+    const char* runningWhen;  // the output that shows it runs
+    bool sigterm;             // ended by SIGTERM, else by its script or a typed quit
+    int status;
+};
+
+const TerminalCase kTerminalCases[] = {
+    {"a script on the terminal's port", true, "get_stat", nullptr, false, 0},
+    {"a failing script on the terminal's port", true, "tag read 0?x?int", nullptr, false, 1},
+    {"SIGTERM in a watch on the terminal's port", true, "get_stat; watch", "Connected", true, 0},
+    {"quit typed at the prompt", false, nullptr, "xtok> ", false, 0},
+    {"SIGTERM at the prompt", false, nullptr, "xtok> ", true, 0},
+};
+
+// However a run ends, the terminal it was started on is left as it was:
+// readline's settings and those of a port on the terminal itself are undone.
+TEST_F(Session, TheTerminalIsLeftAsItWasHoweverTheRunEnds) {
+    for (const TerminalCase& c : kTerminalCases) {
+        Terminal terminal;
+        const std::string before = terminal.settings();
+        std::vector<std::string> arguments = run({});
+        if (c.portOnTerminal) {
+            arguments[3] = configFor("com1");
+            arguments.insert(arguments.end(), {"--map", "com1=/dev/tty"});
+        }
+        if (c.script) {
+            arguments.insert(arguments.end(), {"--exec", c.script});
+        }
+        Subprocess session(arguments, "", false, terminal.slave());
+        if (c.runningWhen) {
+            ASSERT_TRUE(session.waitForOutput(c.runningWhen, 10s)) << c.what;
+        }
+        if (c.sigterm) {
+            kill(session.pid(), SIGTERM);
+        } else if (!c.script) {
+            ASSERT_TRUE(terminal.type("quit\n"));
+        }
+        Finished done = session.finish(10s);
+        EXPECT_EQ(done.status, c.status) << c.what << ": " << done.err;
+        EXPECT_EQ(terminal.settings(), before) << c.what;
+    }
+}
+
 TEST(Cli, DescribeShowsTheNineteenMemoryTypesAndTheWholeXml) {
     Finished summary = runTool({kHost, "describe", kPlugin});
     EXPECT_EQ(summary.status, 0) << summary.err;
@@ -374,10 +505,13 @@ TEST(Cli, TheCompletionScriptOffersTheCommandsAndTheirOptions) {
     EXPECT_EQ(offered("xtok-host ports --"), "--help --json --version\n");
 }
 
-// Every bad input: one line on standard error, its reason, the right status.
+// Every bad input: one line on standard error, its reason, the right status
+// (0 for a value that only earns a warning).
 // In the arguments, {line} is a free pseudo-terminal, {busy} one that another
 // program holds, {locked} a file the user may not open, {dir} a scratch
-// directory, {text} a file that is no plug-in.
+// directory (with big.cfg, a file past 1 MiB; zero.cfg, one with a zero
+// byte; fifo, a FIFO), {text} a file that is no plug-in. The state file
+// retains parity even.
 struct BadInput {
     const char* what;
     std::vector<std::string> arguments;
@@ -419,6 +553,12 @@ const BadInput kBadInputs[] = {
      2},
     {"blank in a value", {"run", "{line}", "--prefix", "02 gap=9"}, "cannot be written", 2},
     {"no configuration at all", {"run", "--config", "hello"}, "unknown format", 2},
+    // Refused whatever is retained: the run does not start disconnected.
+    {"configured baud rate the port lacks",
+     {"run", "--config",
+      "CfgVer=1 model=1 port={line} baudrate=14400 parity=none bits=8 stopbits=1 mode=RS-232"},
+     "cannot start: {line}: baud rate 14400 is not supported",
+     1},
     {"bad tag address",
      {"run", "--config", kNoPort + " port={line}", "--exec", "tag read 0?x?int"},
      "bad tag address '0?x?int'",
@@ -440,7 +580,21 @@ const BadInput kBadInputs[] = {
      1},
     {"bad port map", {"run", "{line}", "--map", "com99=/dev/x"}, "comN=DEVICE", 2},
     {"configuration file missing", {"run", "--config", "@{dir}/none.cfg"}, "cannot read", 2},
-    {"endless configuration file", {"run", "--config", "@/dev/zero"}, "larger than 1 MiB", 2},
+    {"queue size below the editor's range",
+     {"run", "--config", kNoPort + " port={line}", "--exec",
+      "tag write 0?SP_TokenQueueSize?unsignedInt 0"},
+     "warning: SP_TokenQueueSize 0 lies outside the project editor's range 1 to 10000",
+     0},
+    {"queue size above the editor's range",
+     {"run", "--config", kNoPort + " port={line}", "--exec",
+      "tag write 0?SP_TokenQueueSize?unsignedInt 10001"},
+     "SP_TokenQueueSize 10001 lies outside",
+     0},
+    {"configuration file too large", {"run", "--config", "@{dir}/big.cfg"}, "at most 1 MiB", 2},
+    {"configuration file with a zero byte", {"run", "--config", "@{dir}/zero.cfg"}, "zero byte", 2},
+    {"configuration FIFO", {"run", "--config", "@{dir}/fifo"}, "is a FIFO", 2},
+    {"configuration directory", {"run", "--config", "@{dir}"}, "is a directory", 2},
+    {"configuration device", {"run", "--config", "@/dev/zero"}, "is a device", 2},
 };
 
 class BadInputs : public ::testing::Test {
@@ -454,6 +608,11 @@ protected:
         ASSERT_EQ(flock(holder_, LOCK_EX | LOCK_NB), 0);
         std::ofstream(dir_.file("notes.txt")) << "not a plug-in\n";
         std::ofstream(dir_.file("locked")) << "";
+        std::ofstream(dir_.file("big.cfg")) << std::string((1 << 20) + 1, ' ');
+        std::ofstream(dir_.file("zero.cfg")) << kNoPort + std::string(1, '\0') + " port=com1";
+        ASSERT_EQ(mkfifo(dir_.file("fifo").c_str(), 0600), 0);
+        auto storage = host::PermanentStorage::open(dir_.file("retained.sqlite3"), error);
+        ASSERT_TRUE(storage && storage->WriteInt("XTOK", "parity", 1)) << error;
         // The child may run as nobody: it must reach the directory and its
         // state file, but not the locked device.
         chmod(dir_.file("").c_str(), 0777);
@@ -461,20 +620,25 @@ protected:
     }
     void TearDown() override { close(holder_); }
 
-    std::vector<std::string> arguments(const BadInput& input) {
-        std::map<std::string, std::string> values = {{"{line}", line_->slavePath()},
-                                                     {"{busy}", busy_->slavePath()},
-                                                     {"{locked}", dir_.file("locked")},
-                                                     {"{text}", dir_.file("notes.txt")},
-                                                     {"{dir}", dir_.file("")}};
-        std::vector<std::string> result = {kHost};
-        for (std::string argument : input.arguments) {
-            for (const auto& [name, value] : values) {
-                for (std::size_t at; (at = argument.find(name)) != std::string::npos;) {
-                    argument.replace(at, name.size(), value);
-                }
+    /// `text` with the placeholders filled in.
+    std::string substituted(std::string text) const {
+        const std::map<std::string, std::string> values = {{"{line}", line_->slavePath()},
+                                                           {"{busy}", busy_->slavePath()},
+                                                           {"{locked}", dir_.file("locked")},
+                                                           {"{text}", dir_.file("notes.txt")},
+                                                           {"{dir}", dir_.file("")}};
+        for (const auto& [name, value] : values) {
+            for (std::size_t at; (at = text.find(name)) != std::string::npos;) {
+                text.replace(at, name.size(), value);
             }
-            result.push_back(argument);
+        }
+        return text;
+    }
+
+    std::vector<std::string> arguments(const BadInput& input) {
+        std::vector<std::string> result = {kHost};
+        for (const std::string& argument : input.arguments) {
+            result.push_back(substituted(argument));
         }
         if (input.arguments[0] == "run") {
             // A state file of its own for a child run as nobody: root's is not
@@ -502,7 +666,8 @@ TEST_F(BadInputs, GiveOneLineOnStandardErrorAndAFailingStatus) {
         EXPECT_EQ(done.status, input.status) << input.what << ": " << done.err;
         std::vector<std::string> lines = linesOf(done.err);
         EXPECT_EQ(lines.size(), 1u) << input.what << ": " << done.err;
-        EXPECT_NE(done.err.find(input.reason), std::string::npos) << input.what << ": " << done.err;
+        const std::string reason = substituted(input.reason);
+        EXPECT_NE(done.err.find(reason), std::string::npos) << input.what << ": " << done.err;
     }
 }
 

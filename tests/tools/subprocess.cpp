@@ -24,9 +24,18 @@ std::string contentOf(const std::string& path) {
     return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
 }
 
+/// Standard input: the file of `input`, or the terminal, which a new
+/// session's leader takes as its controlling terminal by opening it.
+int childInput(const std::string& dir, const std::string& terminal) {
+    if (terminal.empty()) {
+        return open((dir + "/in").c_str(), O_RDONLY);
+    }
+    return setsid() < 0 ? -1 : open(terminal.c_str(), O_RDWR);
+}
+
 [[noreturn]] void becomeChild(const std::vector<std::string>& arguments, const std::string& dir,
-                              bool asNobody) {
-    const int in = open((dir + "/in").c_str(), O_RDONLY);
+                              bool asNobody, const std::string& terminal) {
+    const int in = childInput(dir, terminal);
     const int out = open((dir + "/out").c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0666);
     const int err = open((dir + "/err").c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0666);
     if (in < 0 || out < 0 || err < 0 || dup2(in, 0) < 0 || dup2(out, 1) < 0 || dup2(err, 2) < 0 ||
@@ -45,14 +54,15 @@ std::string contentOf(const std::string& path) {
 
 }  // namespace
 
-Subprocess::Subprocess(std::vector<std::string> arguments, std::string input, bool asNobody) {
+Subprocess::Subprocess(std::vector<std::string> arguments, std::string input, bool asNobody,
+                       std::string terminal) {
     char dir[] = "/tmp/xtok-run-XXXXXX";
     dir_ = mkdtemp(dir) ? dir : "/tmp";
     chmod(dir_.c_str(), 0777);  // a child run as nobody writes its output here
     std::ofstream(file("in"), std::ios::binary) << input;
     pid_ = fork();
     if (pid_ == 0) {
-        becomeChild(arguments, dir_, asNobody);
+        becomeChild(arguments, dir_, asNobody, terminal);
     }
 }
 

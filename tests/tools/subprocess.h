@@ -22,8 +22,11 @@ public:
     /// Starts `arguments` (the program first) with `input` on its standard
     /// input; its output goes to files, read as it grows. With `asNobody`, a
     /// root test drops the child to user nobody, so that file permissions apply.
+    /// With a `terminal` (a pseudo-terminal's slave), the child runs in a
+    /// session of its own with that as its controlling terminal and standard
+    /// input, in place of `input`.
     explicit Subprocess(std::vector<std::string> arguments, std::string input = "",
-                        bool asNobody = false);
+                        bool asNobody = false, std::string terminal = "");
     /// Kills the child if it still runs, and reaps it.
     ~Subprocess();
     Subprocess(const Subprocess&) = delete;
