@@ -2,11 +2,14 @@
 #pragma once
 
 #include <array>
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <mutex>
 #include <string>
 
+#include "xtokline/constants.h"
 #include "xtokline/host.h"
 
 struct sp_port;
@@ -37,6 +40,10 @@ private:
     std::array<uint8_t, kCapacity> bytes_{};
 };
 
+/// With reconnection on (SerialFactory), a port whose device hung up or
+/// failed closes it and opens the same path again every half second from
+/// within its reads, until the device is back; the plug-in keeps this object
+/// throughout and only sees a silent line meanwhile.
 class SerialPort final : public ISerialPort {
 public:
     /// Opens `device` for raw transfer. Null with `error` set when it cannot.
@@ -59,18 +66,41 @@ public:
     const std::string& device() const { return device_; }
 
 private:
-    SerialPort(std::string device, SerialFactory& factory, sp_port* port, int fd);
+    using Clock = std::chrono::steady_clock;
+    /// An open device file: libserialport's handle where it knows the
+    /// device (null for pseudo-terminals and devices outside sysfs, whose
+    /// fd is then ours to close). fd -1 when closed.
+    struct Device {
+        sp_port* port = nullptr;
+        int fd = -1;
+    };
+    static bool openDevice(const std::string& path, Device& device, std::string& error);
+    static void closeDevice(Device& device);
+
+    SerialPort(std::string device, SerialFactory& factory, Device open);
+    /// "" when `settings` are applied to the open device, else why not.
+    std::string apply(const LineSettings& settings);
     [[gnu::noinline]] bool readWaiting(uint8_t* destination, int32_t timeoutMs);
     bool refill(int32_t timeoutMs);
+    void arrived(std::size_t count);
+    void lose(const std::string& why);
+    bool reopenBefore(Clock::time_point deadline);
+    bool reopen();
+    std::size_t writeAll(const uint8_t* data, std::size_t total);
     bool waitWritable();
 
     std::string device_;
     SerialFactory& factory_;
-    // Null when libserialport does not know the device (pseudo-terminals,
-    // devices outside sysfs); fd_ is then ours to close.
-    sp_port* port_;
-    int fd_;
+    // Writers and Configure come from the runtime's threads while the reader
+    // may swap the device for a reopened one.
+    std::mutex deviceMutex_;
+    Device open_;
+    LineSettings settings_{};  // the last applied, for a reopened device
+    bool configured_ = false;
+    // The reader's own.
     ReadBuffer buffer_;
+    bool lost_ = false;
+    Clock::time_point nextAttempt_{};
 };
 
 }  // namespace xtok::host
