@@ -6,6 +6,7 @@
 #include "protocol/settings.h"
 #include "tools/interrupt.h"
 #include "tools/json_line.h"
+#include "tools/monitor_lines.h"
 #include "tools/token_view.h"
 #include "xtokline/constants.h"
 #include "xtokline/text.h"
@@ -28,6 +29,9 @@ const char* const kHostHelp =
     "                             show received tokens (time, text, hex) and acknowledge\n"
     "                             them, until Ctrl-C, N tokens or the time-out\n"
     "  settings                   the line settings: active, and the SP_ values\n"
+    "  monitor [on|off]           show the line as it happens: bytes both ways, tokens\n"
+    "                             with what ended them, link changes, queue drops\n"
+    "                             (alone: switches it on or off)\n"
     "  help                       this text and the plug-in's console commands\n"
     "  quit                       leave (also exit, or the end of input)\n"
     "Values: numbers in decimal or 0x hex; booleans 0/1, true/false, on/off;\n"
@@ -35,26 +39,6 @@ const char* const kHostHelp =
     "\\xHH \\n \\r \\t \\\\; arrays as numbers separated by blanks or commas; binary as hex.\n"
     "Any other line goes to the plug-in's console, whose read and write take\n"
     "raw hex data:\n";
-
-// The address that reads a setting's SP_ memory type. Texts are sized for
-// any prefix an operator would configure.
-std::string settingAddress(const Setting& setting) {
-    const char* type = "string-256";
-    switch (setting.kind) {
-        case SettingKind::Number:
-            type = "unsignedInt";
-            break;
-        case SettingKind::Byte:
-            type = "unsignedByte";
-            break;
-        case SettingKind::Flag:
-            type = "boolean";
-            break;
-        case SettingKind::Hex:
-            break;
-    }
-    return std::string("0?") + setting.memoryType + "?" + type;
-}
 
 std::vector<std::string> splitWords(const std::string& line) {
     std::vector<std::string> words;
@@ -116,17 +100,25 @@ bool parseSeconds(const std::string& text, double& seconds) {
 }  // namespace
 
 ConsoleSession::ConsoleSession(PluginSession& session, bool json, std::ostream& out,
-                               std::ostream& err)
-    : session_(session), json_(json), out_(out), err_(err) {}
+                               std::ostream& err, MonitorConsole* monitor)
+    : session_(session), json_(json), out_(out), err_(err), monitor_(monitor) {}
 
 bool ConsoleSession::run(LineInput& input) {
     bool allGood = true;
     std::string line;
+    input.showWhileWaiting(monitor_);
     while (!quit_ && input.next(line)) {
+        printEvents();  // what happened before the command, first
         allGood = execute(line) && allGood;
         out_.flush();
+        quit_ = !printEvents() || quit_;
     }
+    printEvents();
     return allGood;
+}
+
+bool ConsoleSession::printEvents() {
+    return !monitor_ || monitor_->print();
 }
 
 bool ConsoleSession::execute(const std::string& raw) {
@@ -151,6 +143,9 @@ bool ConsoleSession::execute(const std::string& raw) {
     }
     if (word == "settings") {
         return settings(line);
+    }
+    if (word == "monitor" && monitor_) {
+        return monitor(line, words);
     }
     // As typed but for the margins: "put" sends the rest of its line,
     // trailing blanks included.
@@ -254,15 +249,18 @@ bool ConsoleSession::watch(const std::string& line, const std::vector<std::strin
         }
         if (intake == Intake::Token) {
             ++seen;
-            report(JsonLine()
-                       .text("command", line)
-                       .text("time", isoTime(token.arrived))
-                       .text("token", token.text)
-                       .number("length", token.length)
-                       .str(),
-                   clockText(token.arrived) + "  " + tokenLine(token));
+            JsonLine json;
+            json.text("command", line)
+                .text("time", isoTime(token.arrived))
+                .text("token", token.text)
+                .number("length", token.length)
+                .text("hex", bytesToHexText(token.text.data(), token.text.size()));
+            if (token.length > token.text.size()) {
+                json.flag("whole", false);
+            }
+            report(json.str(), clockText(token.arrived) + "  " + tokenLine(token));
             out_.flush();
-        } else if (pauseUnlessInterrupted(kWatchPoll)) {
+        } else if (!printEvents() || pauseUnlessInterrupted(kWatchPoll)) {
             break;
         }
     }
@@ -306,9 +304,36 @@ bool ConsoleSession::settings(const std::string& line) {
     return true;
 }
 
+bool ConsoleSession::monitor(const std::string& line, const std::vector<std::string>& words) {
+    const bool toggle = words.size() == 1;
+    if (!toggle && (words.size() > 2 || (words[1] != "on" && words[1] != "off"))) {
+        return fail(line, "use monitor on, monitor off, or monitor alone to switch it");
+    }
+    if (toggle ? !monitor_->isOn() : words[1] == "on") {
+        monitor_->on();
+    } else {
+        monitor_->off();
+    }
+    const bool on = monitor_->isOn();
+    report(JsonLine().text("command", line).flag("ok", true).flag("monitor", on).str(),
+           on ? "monitor on" : "monitor off");
+    return true;
+}
+
+std::string ConsoleSession::withLineStates(const std::string& reply) {
+    std::string text = reply.empty() || reply.back() == '\n' ? reply : reply + "\n";
+    for (const host::LinkEvent& state : session_.lineStates()) {
+        text += lineStateText(state) + "\n";
+    }
+    return text;
+}
+
 bool ConsoleSession::passOn(const std::string& line) {
     bool ok = false;
     std::string reply = session_.command(line, ok);
+    if (ok && line.substr(0, line.find(' ')) == "info") {
+        reply = withLineStates(reply);
+    }
     if (!ok) {
         // The consoles begin their error replies with the word; it is said already.
         std::string why = trimmed(reply, kWhiteSpace);

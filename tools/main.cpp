@@ -1,5 +1,5 @@
 // xtok-host: the xtokline plug-in on a PC, loaded exactly as a panel runtime
-// loads it. Subcommands: demo, run, describe, ports.
+// loads it. Subcommands: demo, run, monitor, describe, ports.
 #include <CLI/CLI.hpp>
 #include <cstdlib>
 #include <cstring>
@@ -42,14 +42,14 @@ bool knownCommand(int argc, char** argv) {
     if (argc < 2 || argv[1][0] == '-') {
         return true;
     }
-    static const char* const kCommands[] = {"demo", "run", "describe", "ports"};
+    static const char* const kCommands[] = {"demo", "run", "monitor", "describe", "ports"};
     for (const char* name : kCommands) {
         if (std::strcmp(argv[1], name) == 0) {
             return true;
         }
     }
     std::cerr << "xtok-host: unknown command '" << argv[1]
-              << "'; the commands are demo, run, describe and ports" << std::endl;
+              << "'; the commands are demo, run, monitor, describe and ports" << std::endl;
     return false;
 }
 
@@ -61,6 +61,28 @@ bool pluginPath(std::string& path) {
     }
     std::cerr << "xtok-host: " << error << std::endl;
     return false;
+}
+
+/// The options of a session on a line, which run and monitor share.
+void addSessionOptions(CLI::App& command, RunOptions& run) {
+    command.add_option("--config", run.config, "Configuration text, or @FILE holding it")
+        ->required();
+    command.add_option("--map", run.maps,
+                       "Device of a port name, e.g. com1=/dev/ttyUSB0 (repeatable)");
+    command.add_option("--state", run.statePath,
+                       "SQLite file for retained settings (default: "
+                       "$XDG_STATE_HOME/xtokline/retained.sqlite3)");
+    command.add_option("--plugin", run.pluginPath, "The plug-in file (default: beside xtok-host)");
+    command.add_option("--instance", run.instanceName,
+                       "Instance name, under which settings are retained (default: XTOK)");
+    command.add_option(
+        "--exec", run.exec,
+        "Commands separated by ';' (\\; for one inside a value): run takes them instead of "
+        "standard input, monitor runs them first");
+    command.add_flag("--json", run.json, "One JSON object per result or event, one per line");
+    command.add_flag("--reconnect", run.reconnect,
+                     "Reopen the device when it comes back after a hang-up or failure");
+    command.add_option("--log", run.logPath, "Append the monitor's lines to this file as well");
 }
 
 }  // namespace
@@ -93,23 +115,20 @@ int main(int argc, char** argv) {
         "watch, settings, and the plug-in's own commands");
     runCommand->footer(
         "Console: tag read ADDRESS, tag write ADDRESS VALUE, watch [--count N] [--timeout S], "
-        "settings, help, quit; any other line goes to the plug-in's own console. help "
+        "settings, monitor [on|off], help, quit; any other line goes to the plug-in's own console. "
+        "help "
         "explains the values. Exit status 1 when any command failed.");
-    runCommand->add_option("--config", run.config, "Configuration text, or @FILE holding it")
-        ->required();
-    runCommand->add_option("--map", run.maps,
-                           "Device of a port name, e.g. com1=/dev/ttyUSB0 (repeatable)");
-    runCommand->add_option("--state", run.statePath,
-                           "SQLite file for retained settings (default: "
-                           "$XDG_STATE_HOME/xtokline/retained.sqlite3)");
-    runCommand->add_option("--plugin", run.pluginPath,
-                           "The plug-in file (default: beside xtok-host)");
-    runCommand->add_option("--instance", run.instanceName,
-                           "Instance name, under which settings are retained (default: XTOK)");
-    runCommand->add_option(
-        "--exec", run.exec,
-        "Commands separated by ';' (\\; for one inside a value) instead of standard input");
-    runCommand->add_flag("--json", run.json, "One JSON object per result, one per line");
+    addSessionOptions(*runCommand, run);
+
+    RunOptions monitor;
+    long monitorCount = 0;
+    CLI::App* monitorCommand = app.add_subcommand(
+        "monitor",
+        "The plug-in on a serial line, showing it as it happens: bytes both ways, tokens "
+        "with what ended them, link changes and queue drops, until Ctrl-C");
+    addSessionOptions(*monitorCommand, monitor);
+    monitorCommand->add_option("--count", monitorCount, "Stop after this many tokens")
+        ->check(CLI::Validator(positive, "N"));
 
     std::string describePath;
     bool wholeXml = false;
@@ -140,6 +159,11 @@ int main(int argc, char** argv) {
     }
     if (*demoCommand) {
         return pluginPath(demo.pluginPath) ? runDemo(demo, std::cout, std::cerr) : 1;
+    }
+    if (*monitorCommand) {
+        return pluginPath(monitor.pluginPath)
+                   ? runMonitor(monitor, monitorCount, std::cout, std::cerr)
+                   : 1;
     }
     return pluginPath(run.pluginPath) ? runConsole(run, std::cout, std::cerr) : 1;
 }

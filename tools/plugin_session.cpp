@@ -2,10 +2,12 @@
 
 #include "host/permanent_storage.h"
 
+#include <algorithm>
 #include <cctype>
 #include <mutex>
 
 #include "tools/interrupt.h"
+#include "xtokline/text.h"
 
 namespace xtok::tools {
 
@@ -37,6 +39,15 @@ bool isHexLine(const std::string& reply) {
 
 /// The consoles report most failures in the reply text alone, with the
 /// command still "known"; a script must see them as failures all the same.
+/// The memory type of a tag address "node?type?datatype".
+std::string memoryTypeOf(const std::string& address) {
+    const std::size_t first = address.find('?');
+    if (first == std::string::npos) {
+        return "";
+    }
+    return address.substr(first + 1, address.find('?', first + 1) - first - 1);
+}
+
 bool replyTellsFailure(const std::string& word, const std::string& reply) {
     if (startsWith(reply, "ERROR") || startsWith(reply, "error") || startsWith(reply, "Can't")) {
         return true;
@@ -48,6 +59,25 @@ bool replyTellsFailure(const std::string& word, const std::string& reply) {
 }
 
 }  // namespace
+
+// Texts are sized for any prefix an operator would configure.
+std::string settingAddress(const Setting& setting) {
+    const char* type = "string-256";
+    switch (setting.kind) {
+        case SettingKind::Number:
+            type = "unsignedInt";
+            break;
+        case SettingKind::Byte:
+            type = "unsignedByte";
+            break;
+        case SettingKind::Flag:
+            type = "boolean";
+            break;
+        case SettingKind::Hex:
+            break;
+    }
+    return std::string("0?") + setting.memoryType + "?" + type;
+}
 
 /// Holds the host's notices while the session starts, so that the reason a
 /// port would not open becomes part of the one error line; passes them on
@@ -104,6 +134,9 @@ std::unique_ptr<PluginSession> PluginSession::start(const SessionOptions& option
     if (!session->load(options, error)) {
         return nullptr;
     }
+    if (options.beforeStart) {
+        options.beforeStart(*session);
+    }
     IProtocol7& protocol = *session->protocol_;
     if (!options.instanceName.empty()) {
         protocol.SetInstanceName(options.instanceName.c_str());
@@ -125,6 +158,8 @@ std::unique_ptr<PluginSession> PluginSession::start(const SessionOptions& option
         return nullptr;
     }
     session->relay_->passOn();
+    session->started_ = true;
+    session->readFraming();
     return session;
 }
 
@@ -135,6 +170,7 @@ bool PluginSession::load(const SessionOptions& options, std::string& error) {
     hostOptions.permanentStorage = options.permanentStorage;
     hostOptions.storagePath = options.statePath;
     hostOptions.notice = [relay = relay_](const std::string& text) { relay->say(text); };
+    hostOptions.reconnect = options.reconnect;
     host_ = host::ServiceProvider::create(hostOptions, error);
     if (!host_) {
         return false;
@@ -242,6 +278,9 @@ bool PluginSession::write(const std::string& address, const std::string& text, s
     bool written = false;
     const std::string kept = retaining(
         [&] { written = protocol_->WriteTag(found, bytes.empty() ? &none : bytes.data()); });
+    if (written) {
+        wrote(address);
+    }
     if (!written) {
         error = "cannot write " + address + ": " + reasonSince(before);
     } else if (!kept.empty()) {
@@ -266,6 +305,9 @@ std::string PluginSession::command(const std::string& line, bool& ok) {
         return "unknown command '" + word + "' (help lists them)";
     }
     ok = known && !replyTellsFailure(word, reply);
+    if (ok) {
+        commanded(line);
+    }
     return reply;
 }
 
@@ -285,10 +327,82 @@ Intake PluginSession::takeToken(Token& token, std::string& error) {
     }
     token.arrived = std::chrono::system_clock::now();
     token.text = stringValue(text.bytes);
-    token.length =
-        static_cast<uint32_t>(length.bytes[0] | length.bytes[1] << 8 | length.bytes[2] << 16 |
-                              static_cast<uint32_t>(length.bytes[3]) << 24);
+    token.length = wordValue(length.bytes);
+    // A zero byte cut the text: the monitor's copy of the same token, if it
+    // saw one, holds the rest.
+    std::string whole;
+    if (token.length > token.text.size() && queue_.oldest(whole) && whole.size() == token.length &&
+        whole.compare(0, token.text.size() + 1, token.text + '\0') == 0) {
+        token.text = whole;
+    }
     return write(kTokenAck, "1", error) ? Intake::Token : Intake::Failed;
+}
+
+FramingSource PluginSession::framingSource() {
+    return [this] { return framing_.get(); };
+}
+
+void PluginSession::follow(std::shared_ptr<host::LineTap> tap) {
+    TagValue count;
+    std::string ignored;
+    // Before the start nothing is queued, and no tag is made yet.
+    queue_.restart(started_ && read(kTokensAvailable, count, ignored) ? wordValue(count.bytes) : 0);
+    if (std::find(taps_.begin(), taps_.end(), tap) == taps_.end()) {
+        taps_.push_back(tap);
+    }
+    host_->serialFactory().attach(tap.get());
+}
+
+void PluginSession::unfollow() {
+    host_->serialFactory().attach(nullptr);
+}
+
+std::vector<host::LinkEvent> PluginSession::lineStates() {
+    return host_->serialFactory().lineStates();
+}
+
+void PluginSession::readFraming() {
+    ActiveFraming framing;
+    TagValue value;
+    std::string ignored;
+    auto text = [&](SettingId id, std::string& out) {
+        if (read(settingAddress(kSettings[id]), value, ignored)) {
+            out = stringValue(value.bytes);
+        }
+    };
+    auto number = [&](SettingId id, int32_t& out) {
+        if (read(settingAddress(kSettings[id]), value, ignored)) {
+            out = static_cast<int32_t>(wordValue(value.bytes));
+        }
+    };
+    text(kRxPrefix, framing.rx.prefix);
+    text(kRxSuffix, framing.rx.suffix);
+    number(kGap, framing.rx.gap);
+    number(kTokenQueueSize, framing.queueLimit);
+    framing_.set(framing);
+}
+
+void PluginSession::wrote(const std::string& address) {
+    const std::string type = memoryTypeOf(address);
+    if (type == "token_ack") {
+        queue_.acknowledged();
+    } else if (type == "SP_Done") {
+        queue_.cleared();
+        readFraming();
+    }
+}
+
+// As the plug-in's console splits its words: at each blank.
+void PluginSession::commanded(const std::string& line) {
+    std::vector<std::string> words;
+    splitTrimmed(line, ' ', words);
+    if (words[0] == "token_ack") {
+        words.size() == 2 && words[1] == "all" ? queue_.cleared() : queue_.acknowledged();
+    } else if (words[0] == "write" && words.size() > 1) {
+        wrote(words[1]);
+    } else {
+        framing_.noteCommand(line);
+    }
 }
 
 }  // namespace xtok::tools

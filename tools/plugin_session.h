@@ -4,6 +4,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <memory>
 #include <string>
@@ -11,9 +12,14 @@
 
 #include "host/plugin_loader.h"
 #include "host/service_provider.h"
+#include "protocol/settings.h"
+#include "tools/active_framing.h"
+#include "tools/queue_mirror.h"
 #include "tools/tag_values.h"
 
 namespace xtok::tools {
+
+class PluginSession;
 
 struct SessionOptions {
     std::string pluginPath;
@@ -26,6 +32,11 @@ struct SessionOptions {
     /// Host notices after a successful start; during it they become part of
     /// the start error instead.
     host::Notice notice = host::printNotice;
+    /// Reopen the port's device after a hang-up or failure.
+    bool reconnect = false;
+    /// Called once the plug-in is loaded, before it is configured and
+    /// started: where a line monitor begins in time to see the port open.
+    std::function<void(PluginSession&)> beforeStart;
 };
 
 /// A tag's value as read.
@@ -36,12 +47,17 @@ struct TagValue {
 
 /// A received token as the panel sees it.
 struct Token {
-    std::string text;  // rx_token: the stored form up to its first zero byte
-    uint32_t length;   // rx_token_len: the stored form's whole length
+    // The stored form: rx_token gives it up to its first zero byte, the line
+    // monitor's copy whole.
+    std::string text;
+    uint32_t length;  // rx_token_len: the stored form's whole length
     std::chrono::system_clock::time_point arrived;
 };
 
 enum class Intake { None, Token, Failed };
+
+/// The address that reads a setting's SP_ memory type.
+std::string settingAddress(const Setting& setting);
 
 class NoticeRelay;
 
@@ -69,6 +85,16 @@ public:
     /// Takes the oldest received token off the queue, if there is one.
     Intake takeToken(Token& token, std::string& error);
 
+    /// The receive framing and queue limit in force, for a line monitor.
+    FramingSource framingSource();
+    /// The queue as the host sees it; acknowledgements made here count.
+    QueueMirror& queue() { return queue_; }
+    /// `tap` hears the line from now on; it is kept for the session's life.
+    void follow(std::shared_ptr<host::LineTap> tap);
+    void unfollow();
+    /// The latest opening, closing, loss or reconnection of each device.
+    std::vector<host::LinkEvent> lineStates();
+
 private:
     PluginSession() = default;
     bool load(const SessionOptions& options, std::string& error);
@@ -86,16 +112,27 @@ private:
     /// (or nothing is stored), else why they are not.
     template <class Call>
     std::string retaining(Call call);
+    /// Reads the framing in force, when nothing is staged: at the start and
+    /// after SP_Done.
+    void readFraming();
+    /// What a successful write or console line does to the queue and the
+    /// framing.
+    void wrote(const std::string& address);
+    void commanded(const std::string& line);
 
     struct TagDeleter {
         void operator()(ITag* tag) const;
     };
 
     // Declared in the order of building; destroyed the other way round.
+    FramingState framing_;
+    QueueMirror queue_;
+    std::vector<std::shared_ptr<host::LineTap>> taps_;
     std::shared_ptr<NoticeRelay> relay_;
     std::unique_ptr<host::ServiceProvider> host_;
     std::unique_ptr<host::LoadedPlugin> plugin_;
     IProtocol7* protocol_ = nullptr;
+    bool started_ = false;
     std::map<std::string, std::unique_ptr<ITag, TagDeleter>> tags_;
 };
 
