@@ -31,6 +31,8 @@ void TokenFramer::restart() {
     silentMs_ = 0;
 }
 
+// Taken at once when a pass ends, as the plug-in takes its framing right
+// after: a setting changed a moment later applies from the pass after.
 void TokenFramer::beginPass() {
     const RxFraming rules = rules_();
     prefix_ = hexTextToBytes(rules.prefix);
@@ -52,8 +54,8 @@ bool TokenFramer::byte(uint8_t value, FramedToken& token) {
         return false;
     }
     const bool ended = collect(c, token);
-    if (inPass_ && frame_.size() > kMaxFrame) {
-        restart();
+    if (frame_.size() > kMaxFrame) {
+        beginPass();
     }
     return ended;
 }
@@ -81,7 +83,7 @@ bool TokenFramer::collect(char c, FramedToken& token) {
     }
     if (!suffix_.empty() && endsWith(suffix_)) {
         token = {frame_.substr(p, length - p - suffix_.size()), TokenEnd::Suffix};
-        restart();
+        beginPass();
         return true;
     }
     if (suffix_.empty() && p > 0 && endsWith(prefix_)) {
@@ -113,7 +115,7 @@ bool TokenFramer::silence(int32_t ms, FramedToken& token) {
     if (ended) {
         token = {frame_.substr(p), TokenEnd::Gap};
     }
-    restart();
+    beginPass();
     return ended;
 }
 

@@ -30,7 +30,8 @@ struct FramedToken {
 class TokenFramer {
 public:
     /// `rules` is asked at the start of each pass, when the plug-in takes
-    /// its framing too.
+    /// its framing too: at the end of the pass before, or after a restart
+    /// at the first byte or silence.
     explicit TokenFramer(std::function<RxFraming()> rules) : rules_(std::move(rules)) {}
 
     /// A byte the plug-in read; true when it ended a token, given in `token`.
