@@ -107,6 +107,8 @@ int main(int argc, char** argv) {
         ->capture_default_str();
     demoCommand->add_option("--plugin", demo.pluginPath,
                             "The plug-in file (default: beside xtok-host)");
+    demoCommand->add_flag("--monitor", demo.monitor,
+                          "Show the line as it happens too, as xtok-host monitor does");
 
     RunOptions run;
     CLI::App* runCommand = app.add_subcommand(
