@@ -23,6 +23,11 @@ ISerialPort* SerialFactory::Open(const char* name) {
         notice_("cannot open " + which + ": " + error);
         return nullptr;
     }
+    {
+        std::lock_guard<std::mutex> lock(mutex_);
+        port->listen(tap());
+        open_.insert(port.get());
+    }
     link(LinkChange::Opened, device);
     return port.release();
 }
@@ -31,8 +36,18 @@ void SerialFactory::Close(ISerialPort* port) {
     auto* serial = static_cast<SerialPort*>(port);
     if (serial) {
         link(LinkChange::Closed, serial->device());
+        std::lock_guard<std::mutex> lock(mutex_);
+        open_.erase(serial);
     }
     delete serial;
+}
+
+void SerialFactory::attach(LineTap* tap) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    tap_.store(tap, std::memory_order_release);
+    for (SerialPort* port : open_) {
+        port->listen(tap);
+    }
 }
 
 void SerialFactory::noticeOnce(const std::string& key, const std::string& text) {

@@ -15,6 +15,8 @@
 
 namespace xtok::host {
 
+class SerialPort;
+
 class SerialFactory final : public HostService<ISerialFactory> {
 public:
     /// With `reconnect`, its ports reopen a lost device (SerialPort).
@@ -35,7 +37,7 @@ public:
     /// From now on every port tells `tap` what it hears; null stops that. A
     /// tap may still be called once more after it was replaced, so it must
     /// outlive the ports.
-    void attach(LineTap* tap) { tap_.store(tap, std::memory_order_release); }
+    void attach(LineTap* tap);
     LineTap* tap() const { return tap_.load(std::memory_order_acquire); }
     /// A port's link change: kept as its line's state and told to the tap.
     void link(LinkChange change, const std::string& device, const std::string& settings = "",
@@ -50,6 +52,7 @@ private:
     std::atomic<LineTap*> tap_{nullptr};
     mutable std::mutex mutex_;
     std::set<std::string> noticed_;
+    std::set<SerialPort*> open_;
     std::map<std::string, LinkEvent> states_;
 };
 

@@ -155,7 +155,8 @@ std::string SerialPort::apply(const LineSettings& settings) {
 // Called once per received byte: a copy out of the buffer, with the reading,
 // the waiting and a monitor's tap out of line.
 bool SerialPort::ReadByte(uint8_t* destination, int32_t timeoutMs, int32_t) {
-    if (destination && !buffer_.empty() && !factory_.tap()) {
+    // Relaxed: only whether a tap listens; the slow path takes it properly.
+    if (destination && !buffer_.empty() && !tap_.load(std::memory_order_relaxed)) {
         *destination = buffer_.take();
         return true;
     }
@@ -167,13 +168,13 @@ bool SerialPort::readWaiting(uint8_t* destination, int32_t timeoutMs) {
         return false;
     }
     if (buffer_.empty() && !refill(std::max(timeoutMs, 0))) {
-        if (LineTap* tap = factory_.tap()) {
+        if (LineTap* tap = tap_.load(std::memory_order_acquire)) {
             tap->timedOut(timeoutMs);
         }
         return false;
     }
     *destination = buffer_.take();
-    if (LineTap* tap = factory_.tap()) {
+    if (LineTap* tap = tap_.load(std::memory_order_acquire)) {
         tap->delivered(*destination);
     }
     return true;
@@ -219,7 +220,7 @@ bool SerialPort::refill(int32_t timeoutMs) {
 
 void SerialPort::arrived(std::size_t count) {
     buffer_.filled(count);
-    if (LineTap* tap = factory_.tap()) {
+    if (LineTap* tap = tap_.load(std::memory_order_acquire)) {
         tap->received(buffer_.space(), count, WallClock::now());
     }
 }
@@ -284,7 +285,7 @@ bool SerialPort::Write(const uint8_t* data, int32_t length, int32_t) {
         std::lock_guard<std::mutex> lock(deviceMutex_);
         done = writeAll(data, total);
     }
-    if (LineTap* tap = factory_.tap()) {
+    if (LineTap* tap = tap_.load(std::memory_order_acquire)) {
         tap->sent(data, done, total, at);
     }
     return done == total;

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <array>
+#include <atomic>
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
@@ -9,6 +10,7 @@
 #include <mutex>
 #include <string>
 
+#include "host/line_tap.h"
 #include "xtokline/constants.h"
 #include "xtokline/host.h"
 
@@ -64,6 +66,8 @@ public:
     bool Write(const uint8_t* data, int32_t length, int32_t flags) override;
 
     const std::string& device() const { return device_; }
+    /// Tells `tap` what it hears from now on (SerialFactory::attach).
+    void listen(LineTap* tap) { tap_.store(tap, std::memory_order_release); }
 
 private:
     using Clock = std::chrono::steady_clock;
@@ -91,6 +95,7 @@ private:
 
     std::string device_;
     SerialFactory& factory_;
+    std::atomic<LineTap*> tap_{nullptr};
     // Writers and Configure come from the runtime's threads while the reader
     // may swap the device for a reopened one.
     std::mutex deviceMutex_;
