@@ -37,8 +37,6 @@ bool isHexLine(const std::string& reply) {
     return !reply.empty();
 }
 
-/// The consoles report most failures in the reply text alone, with the
-/// command still "known"; a script must see them as failures all the same.
 /// The memory type of a tag address "node?type?datatype".
 std::string memoryTypeOf(const std::string& address) {
     const std::size_t first = address.find('?');
@@ -48,6 +46,8 @@ std::string memoryTypeOf(const std::string& address) {
     return address.substr(first + 1, address.find('?', first + 1) - first - 1);
 }
 
+/// The consoles report most failures in the reply text alone, with the
+/// command still "known"; a script must see them as failures all the same.
 bool replyTellsFailure(const std::string& word, const std::string& reply) {
     if (startsWith(reply, "ERROR") || startsWith(reply, "error") || startsWith(reply, "Can't")) {
         return true;
@@ -278,15 +278,15 @@ bool PluginSession::write(const std::string& address, const std::string& text, s
     bool written = false;
     const std::string kept = retaining(
         [&] { written = protocol_->WriteTag(found, bytes.empty() ? &none : bytes.data()); });
-    if (written) {
-        wrote(address);
-    }
     if (!written) {
         error = "cannot write " + address + ": " + reasonSince(before);
-    } else if (!kept.empty()) {
+        return false;
+    }
+    wrote(address);
+    if (!kept.empty()) {
         error = address + " written, but its " + kept;
     }
-    return written && kept.empty();
+    return kept.empty();
 }
 
 std::string PluginSession::command(const std::string& line, bool& ok) {
