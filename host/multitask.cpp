@@ -8,7 +8,6 @@
 #include <system_error>
 #include <vector>
 
-
 namespace xtok::host {
 
 bool Task::IsStopRequested() {

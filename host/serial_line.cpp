@@ -97,6 +97,15 @@ constexpr sp_parity kParities[] = {SP_PARITY_NONE, SP_PARITY_EVEN, SP_PARITY_ODD
 
 }  // namespace
 
+std::string describeLine(const LineSettings& s) {
+    auto named = [](int32_t code, const char* const* names, int32_t count) {
+        return code >= 0 && code < count ? std::string(names[code]) : std::to_string(code);
+    };
+    return std::to_string(s.baud) + "," + named(s.parity, kParityNames, kParityCount) + "," +
+           std::to_string(s.bits) + "," + std::to_string(s.stop) + "," +
+           named(s.mode, kModeNames, kModeCount);
+}
+
 std::string checkSettings(const LineSettings& s) {
     if (s.baud <= 0) {
         return "baud rate " + std::to_string(s.baud) + " is not valid";

@@ -14,6 +14,9 @@ namespace xtok::host {
 
 using xtok::LineSettings;
 
+/// "9600,none,8,1,RS-232": codes by their names, numbers where a code has none.
+std::string describeLine(const LineSettings& settings);
+
 /// Each of these answers "" on success, else why not.
 std::string checkSettings(const LineSettings& settings);
 std::string applyWithLibserialport(sp_port* port, const LineSettings& settings);

@@ -19,7 +19,7 @@ std::unique_ptr<ServiceProvider> ServiceProvider::create(HostOptions options, st
 ServiceProvider::ServiceProvider(const HostOptions& options,
                                  std::unique_ptr<PermanentStorage> storage)
     : notice_(options.notice),
-      serialFactory_(options.ports, options.notice),
+      serialFactory_(options.ports, options.notice, options.reconnect),
       storage_(std::move(storage)),
       multiTask_(options.notice) {
     offer(&multiTask_, static_cast<IMultiTask2*>(&multiTask_));

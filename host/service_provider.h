@@ -25,6 +25,8 @@ struct HostOptions {
     std::string storagePath;
     /// Where the services' complaints go.
     Notice notice = printNotice;
+    /// Whether a serial port reopens its device after a hang-up or failure.
+    bool reconnect = false;
 };
 
 class ServiceProvider final : public IServiceProvider {

@@ -6,6 +6,7 @@
 #include "tools/help_topics.h"
 #include "tools/interrupt.h"
 #include "tools/json_line.h"
+#include "tools/monitor_lines.h"
 #include "tools/settings_view.h"
 #include "tools/token_view.h"
 #include "xtokline/text.h"
@@ -31,6 +32,9 @@ const char* const kHostHelp =
     "  reset-retained             forget the settings SP_Done retained for this\n"
     "                             instance and start the plug-in anew with the\n"
     "                             configured ones\n"
+    "  monitor [on|off]           show the line as it happens: bytes both ways, tokens\n"
+    "                             with what ended them, link changes, queue drops\n"
+    "                             (alone: switches it on or off)\n"
     "  help                       this text and the plug-in's console commands\n"
     "  help datatypes             the data types of a tag address\n"
     "  help memorytypes           the plug-in's memory types\n"
@@ -90,18 +94,28 @@ bool parseSeconds(const std::string& text, double& seconds) {
 }  // namespace
 
 ConsoleSession::ConsoleSession(PluginSession& session, const PluginDescription& description,
-                               bool json, std::ostream& out, std::ostream& err)
-    : session_(session), description_(description), json_(json), out_(out), err_(err) {}
+                               bool json, std::ostream& out, std::ostream& err,
+                               MonitorConsole* monitor)
+    : session_(session),
+      description_(description),
+      json_(json),
+      out_(out),
+      err_(err),
+      monitor_(monitor) {}
 
 bool ConsoleSession::run(LineInput& input) {
     bool allGood = true;
     std::string line;
     showMessages();
+    input.showWhileWaiting(monitor_);
     while (!quit_ && input.next(line)) {
+        printEvents();  // what happened before the command, first
         allGood = execute(line) && allGood;
         showMessages();
         out_.flush();
+        quit_ = !printEvents() || quit_;
     }
+    printEvents();
     return allGood;
 }
 
@@ -120,6 +134,10 @@ void ConsoleSession::showMessages() {
                  << std::endl;
         }
     }
+}
+
+bool ConsoleSession::printEvents() {
+    return !monitor_ || monitor_->print();
 }
 
 bool ConsoleSession::execute(const std::string& raw) {
@@ -147,6 +165,9 @@ bool ConsoleSession::execute(const std::string& raw) {
     }
     if (word == "reset-retained") {
         return resetRetained(line);
+    }
+    if (word == "monitor" && monitor_) {
+        return monitor(line, words);
     }
     // As typed but for the margins: "put" sends the rest of its line,
     // trailing blanks included.
@@ -261,16 +282,19 @@ bool ConsoleSession::watch(const std::string& line, const std::vector<std::strin
         }
         if (intake == Intake::Token) {
             ++seen;
-            report(JsonLine()
-                       .text("command", line)
-                       .flag("ok", true)
-                       .text("time", isoTime(token.arrived))
-                       .text("token", token.text)
-                       .number("length", token.length)
-                       .str(),
-                   clockText(token.arrived) + "  " + tokenLine(token));
+            JsonLine json;
+            json.text("command", line)
+                .flag("ok", true)
+                .text("time", isoTime(token.arrived))
+                .text("token", token.text)
+                .number("length", token.length)
+                .text("hex", bytesToHexText(token.text.data(), token.text.size()));
+            if (token.length > token.text.size()) {
+                json.flag("whole", false);
+            }
+            report(json.str(), clockText(token.arrived) + "  " + tokenLine(token));
             out_.flush();
-        } else if (pauseUnlessInterrupted(kWatchPoll)) {
+        } else if (!printEvents() || pauseUnlessInterrupted(kWatchPoll)) {
             break;
         }
     }
@@ -308,9 +332,36 @@ bool ConsoleSession::resetRetained(const std::string& line) {
     return true;
 }
 
+bool ConsoleSession::monitor(const std::string& line, const std::vector<std::string>& words) {
+    const bool toggle = words.size() == 1;
+    if (!toggle && (words.size() > 2 || (words[1] != "on" && words[1] != "off"))) {
+        return fail(line, "use monitor on, monitor off, or monitor alone to switch it");
+    }
+    if (toggle ? !monitor_->isOn() : words[1] == "on") {
+        monitor_->on();
+    } else {
+        monitor_->off();
+    }
+    const bool on = monitor_->isOn();
+    report(JsonLine().text("command", line).flag("ok", true).flag("monitor", on).str(),
+           on ? "monitor on" : "monitor off");
+    return true;
+}
+
+std::string ConsoleSession::withLineStates(const std::string& reply) {
+    std::string text = reply.empty() || reply.back() == '\n' ? reply : reply + "\n";
+    for (const host::LinkEvent& state : session_.lineStates()) {
+        text += lineStateText(state) + "\n";
+    }
+    return text;
+}
+
 bool ConsoleSession::passOn(const std::string& line) {
     bool ok = false;
     std::string reply = session_.command(line, ok);
+    if (ok && line.substr(0, line.find(' ')) == "info") {
+        reply = withLineStates(reply);
+    }
     if (!ok) {
         // The consoles begin their error replies with the word; it is said already.
         std::string why = trimmed(reply, kWhiteSpace);

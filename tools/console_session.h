@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "tools/line_input.h"
+#include "tools/monitor_console.h"
 #include "tools/plugin_description.h"
 #include "tools/plugin_session.h"
 
@@ -17,10 +18,12 @@ class ConsoleSession {
 public:
     /// With `json`, every result is one JSON object on one line of `out`.
     /// `description` is the plug-in's, for "help memorytypes".
+    /// With `monitor`, its lines are printed between and during commands.
     ConsoleSession(PluginSession& session, const PluginDescription& description, bool json,
-                   std::ostream& out, std::ostream& err);
+                   std::ostream& out, std::ostream& err, MonitorConsole* monitor = nullptr);
 
-    /// Runs lines until the input ends or "quit"; true when none failed.
+    /// Runs lines until the input ends, "quit", or the monitor's end; true
+    /// when none failed.
     bool run(LineInput& input);
     /// One line; false when it failed.
     bool execute(const std::string& line);
@@ -36,7 +39,12 @@ private:
     bool watch(const std::string& line, const std::vector<std::string>& words);
     bool settings(const std::string& line);
     bool resetRetained(const std::string& line);
+    bool monitor(const std::string& line, const std::vector<std::string>& words);
     bool passOn(const std::string& line);
+    /// The plug-in's info and the state of each line the host opened.
+    std::string withLineStates(const std::string& reply);
+    /// Prints the monitor's waiting lines; false once it reached its end.
+    bool printEvents();
 
     bool fail(const std::string& line, const std::string& error);
     void report(const std::string& json, const std::string& text);
@@ -46,6 +54,7 @@ private:
     bool json_;
     std::ostream& out_;
     std::ostream& err_;
+    MonitorConsole* monitor_;
     bool quit_ = false;
 };
 

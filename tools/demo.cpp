@@ -4,6 +4,7 @@
 #include <ostream>
 
 #include "tools/interrupt.h"
+#include "tools/monitor_console.h"
 #include "tools/plugin_session.h"
 #include "tools/pty_pair.h"
 #include "tools/simulated_device.h"
@@ -33,8 +34,9 @@ std::string configFor(const std::string& port) {
 
 class Demo {
 public:
-    Demo(PluginSession& session, const DemoOptions& options, std::ostream& out, std::ostream& err)
-        : session_(session), options_(options), out_(out), err_(err) {}
+    Demo(PluginSession& session, const DemoOptions& options, std::ostream& out, std::ostream& err,
+         MonitorConsole* monitor)
+        : session_(session), options_(options), out_(out), err_(err), monitor_(monitor) {}
 
     int run() {
         Clock::time_point lastAckDeadline{};
@@ -42,6 +44,9 @@ public:
             bool finished = options_.count > 0 && codes_ >= options_.count;
             if (finished && (acks_ >= answers_ || Clock::now() >= lastAckDeadline)) {
                 break;
+            }
+            if (monitor_) {
+                monitor_->print();
             }
             Token token;
             std::string error;
@@ -56,6 +61,9 @@ public:
             if (!finished && options_.count > 0 && codes_ >= options_.count) {
                 lastAckDeadline = Clock::now() + kLastAckPatience;
             }
+        }
+        if (monitor_) {
+            monitor_->print();
         }
         out_ << codes_ << (codes_ == 1 ? " code" : " codes") << " received, " << answers_
              << " answered, " << acks_ << " confirmed by the reader" << std::endl;
@@ -86,6 +94,7 @@ private:
     const DemoOptions& options_;
     std::ostream& out_;
     std::ostream& err_;
+    MonitorConsole* monitor_;
     long codes_ = 0;
     long answers_ = 0;
     long acks_ = 0;
@@ -106,6 +115,13 @@ int runDemo(const DemoOptions& options, std::ostream& out, std::ostream& err) {
     // Settings an operator retained for real lines must not reach the demo,
     // nor the demo's reach them.
     sessionOptions.permanentStorage = false;
+    std::unique_ptr<MonitorConsole> monitor;
+    if (options.monitor) {
+        sessionOptions.beforeStart = [&](PluginSession& loaded) {
+            monitor = std::make_unique<MonitorConsole>(loaded, false, out, err);
+            monitor->on();
+        };
+    }
     std::unique_ptr<PluginSession> session = PluginSession::start(sessionOptions, error);
     if (!session) {
         err << "xtok-host: " << error << std::endl;
@@ -125,7 +141,7 @@ int runDemo(const DemoOptions& options, std::ostream& out, std::ostream& err) {
                 ? "stops after " + std::to_string(options.count) + " codes or at Ctrl-C"
                 : "Ctrl-C stops")
         << std::endl;
-    return Demo(*session, options, out, err).run();
+    return Demo(*session, options, out, err, monitor.get()).run();
 }
 
 }  // namespace xtok::tools

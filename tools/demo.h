@@ -13,6 +13,7 @@ struct DemoOptions {
     std::string pluginPath;
     long count = 0;        // codes to receive before stopping; 0 until Ctrl-C
     int intervalMs = 700;  // between the reader's codes
+    bool monitor = false;  // the line monitor's lines among the demo's
 };
 
 /// The exit status.

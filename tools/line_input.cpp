@@ -55,7 +55,8 @@ private:
 };
 
 /// Readline through its callback interface: the loop waits in poll, so a
-/// Ctrl-C arrives as EINTR and only clears the line being typed.
+/// Ctrl-C arrives as EINTR and only clears the line being typed, and lines
+/// of a feed are printed while a command is half typed.
 class ReadlineInput final : public LineInput {
 public:
     explicit ReadlineInput(std::string prompt) : prompt_(std::move(prompt)) {
@@ -82,8 +83,8 @@ public:
         ended_ = false;
         rl_callback_handler_install(prompt_.c_str(), &ReadlineInput::onLine);
         while (!done_) {
-            pollfd ready{STDIN_FILENO, POLLIN, 0};
-            int count = poll(&ready, 1, -1);
+            pollfd ready[2] = {{STDIN_FILENO, POLLIN, 0}, {feed_ ? feed_->fd() : -1, POLLIN, 0}};
+            int count = poll(ready, 2, -1);
             if (count < 0 && errno == EINTR && terminationRequested()) {
                 break;
             }
@@ -93,10 +94,12 @@ public:
                 }
                 continue;
             }
-            if (count < 0) {
+            if (count < 0 || ((ready[1].revents & POLLIN) && !showFeed())) {
                 break;
             }
-            rl_callback_read_char();
+            if (ready[0].revents) {
+                rl_callback_read_char();
+            }
         }
         rl_callback_handler_remove();
         current_ = nullptr;
@@ -116,6 +119,15 @@ private:
         std::free(text);
         // The callback handler would print the prompt again right away.
         rl_callback_handler_remove();
+    }
+    /// The feed's lines above the prompt, and the prompt with what was
+    /// typed so far below them again.
+    bool showFeed() {
+        rl_clear_visible_line();
+        const bool going = feed_->print();
+        rl_on_new_line();
+        rl_redisplay();
+        return going;
     }
     static void abandonLine() {
         rl_free_line_state();

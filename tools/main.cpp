@@ -1,5 +1,5 @@
 // xtok-host: the xtokline plug-in on a PC, loaded exactly as a panel runtime
-// loads it. Subcommands: demo, run, describe, ports, completion.
+// loads it. Subcommands: demo, run, monitor, describe, ports, completion.
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <cstring>
@@ -75,30 +75,57 @@ CLI::App* addDemo(CLI::App& app, DemoOptions& demo) {
         ->capture_default_str();
     command->add_option("--plugin", demo.pluginPath,
                         "The plug-in file (default: beside xtok-host)");
+    command->add_flag("--monitor", demo.monitor,
+                      "Show the line as it happens too, as xtok-host monitor does");
     return command;
 }
 
-CLI::App* addRun(CLI::App& app, RunOptions& run, const PluginDescription& description) {
-    CLI::App* command = app.add_subcommand(
-        "run",
-        "The plug-in on a serial line with a console: typed tag reads and writes, watch, "
-        "settings, and the plug-in's own commands. Without --config the editor's defaults "
-        "fill the line; options set single keys.");
-    command->footer(
-        "Console: tag read ADDRESS, tag write ADDRESS VALUE, watch [--count N] [--timeout S], "
-        "settings, reset-retained, help [datatypes|memorytypes], quit; any other line goes to "
-        "the plug-in's own console. Exit status 1 when any command failed.");
+/// A session on a line, which run and monitor share.
+CLI::App* addSession(CLI::App& app, const char* name, const char* what, RunOptions& run,
+                     const PluginDescription& description) {
+    CLI::App* command = app.add_subcommand(name, what);
     addLineOptions(*command, run.line, description);
     command->add_flag("--reset-retained", run.resetRetained,
                       "Forget the settings SP_Done retained for the instance before starting");
     command->add_option(
         "--exec", run.exec,
-        "Commands separated by ';' (\\; for one inside a value) instead of standard input");
-    command->add_flag("--json", run.json, "One JSON object per result, one per line");
+        "Commands separated by ';' (\\; for one inside a value): run takes them instead of "
+        "standard input, monitor runs them first");
+    command->add_flag("--json", run.json, "One JSON object per result or event, one per line");
+    command->add_flag("--reconnect", run.reconnect,
+                      "Reopen the device when it comes back after a hang-up or failure");
+    command->add_option("--log", run.logPath, "Append the monitor's lines to this file as well");
     return command;
 }
 
-int startRun(const CLI::App& command, RunOptions& run, const PluginAtHand& plugin) {
+CLI::App* addRun(CLI::App& app, RunOptions& run, const PluginDescription& description) {
+    CLI::App* command =
+        addSession(app, "run",
+                   "The plug-in on a serial line with a console: typed tag reads and writes, "
+                   "watch, settings, a monitor of the line, and the plug-in's own commands. "
+                   "Without --config the editor's defaults fill the line; options set single "
+                   "keys.",
+                   run, description);
+    command->footer(
+        "Console: tag read ADDRESS, tag write ADDRESS VALUE, watch [--count N] [--timeout S], "
+        "settings, monitor [on|off], reset-retained, help [datatypes|memorytypes], quit; any "
+        "other line goes to the plug-in's own console. Exit status 1 when any command failed.");
+    return command;
+}
+
+CLI::App* addMonitor(CLI::App& app, RunOptions& monitor, const PluginDescription& description) {
+    CLI::App* command =
+        addSession(app, "monitor",
+                   "The plug-in on a serial line, showing it as it happens: bytes both ways, "
+                   "tokens with what ended them, link changes and queue drops, until Ctrl-C",
+                   monitor, description);
+    command->add_option("--count", monitor.count, "Stop after this many tokens")
+        ->check(CLI::Validator(positive, "N"));
+    return command;
+}
+
+int startSession(const CLI::App& command, RunOptions& run, bool monitor,
+                 const PluginAtHand& plugin) {
     if (!plugin.described) {
         reportFaults({plugin.error}, run.json, std::cout, std::cerr);
         return 1;
@@ -106,8 +133,8 @@ int startRun(const CLI::App& command, RunOptions& run, const PluginAtHand& plugi
     run.line.pluginPath = plugin.path;
     SessionOptions session;
     std::vector<std::string> faults = lineFaults(command, run.line, plugin.description, session);
-    session.resetRetained = run.resetRetained;
-    return runConsole(run, session, plugin.description, faults, std::cout, std::cerr);
+    return runSession(run, monitor, std::move(session), plugin.description, std::move(faults),
+                      std::cout, std::cerr);
 }
 
 /// --plugin when given, else the plug-in beside this program.
@@ -149,6 +176,8 @@ int main(int argc, char** argv) {
     CLI::App* demoCommand = addDemo(app, demo);
     RunOptions run;
     CLI::App* runCommand = addRun(app, run, plugin.description);
+    RunOptions monitor;
+    CLI::App* monitorCommand = addMonitor(app, monitor, plugin.description);
 
     std::string describePath;
     bool wholeXml = false;
@@ -193,5 +222,8 @@ int main(int argc, char** argv) {
     if (*demoCommand) {
         return pluginPath(demo.pluginPath) ? runDemo(demo, std::cout, std::cerr) : 1;
     }
-    return startRun(*runCommand, run, plugin);
+    if (*monitorCommand) {
+        return startSession(*monitorCommand, monitor, true, plugin);
+    }
+    return startSession(*runCommand, run, false, plugin);
 }

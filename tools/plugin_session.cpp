@@ -2,6 +2,7 @@
 
 #include "host/permanent_storage.h"
 
+#include <algorithm>
 #include <cctype>
 #include <cstring>
 #include <mutex>
@@ -40,6 +41,7 @@ bool isHexLine(const std::string& reply) {
     return !reply.empty();
 }
 
+/// The memory type of a tag address "node?type?datatype".
 /// The consoles report most failures in the reply text alone, with the
 /// command still "known"; a script must see them as failures all the same.
 bool replyTellsFailure(const std::string& word, const std::string& reply) {
@@ -71,10 +73,14 @@ std::unique_ptr<PluginSession> PluginSession::start(const SessionOptions& option
     if (!cleared.empty()) {
         session->say(false, cleared);
     }
+    if (options.beforeStart) {
+        options.beforeStart(*session);
+    }
     if (!session->configureAndStart(error)) {
         return nullptr;
     }
     session->relay_->passOn();
+    session->started_ = true;
     return session;
 }
 
@@ -85,6 +91,7 @@ bool PluginSession::load(const SessionOptions& options, std::string& error) {
     hostOptions.permanentStorage = options.permanentStorage;
     hostOptions.storagePath = options.statePath;
     hostOptions.notice = [relay = relay_](const std::string& text) { relay->say(text); };
+    hostOptions.reconnect = options.reconnect;
     host_ = host::ServiceProvider::create(hostOptions, error);
     if (!host_) {
         return false;
@@ -126,6 +133,9 @@ bool PluginSession::configureAndStart(std::string& error) {
     settings_.configured(config_);
     if (host::PermanentStorage* storage = host_->permanentStorage()) {
         settings_.retainedAtStart(*storage, protocol.GetInstanceName());
+    }
+    framing_.set(settings_.framing());
+    if (host::PermanentStorage* storage = host_->permanentStorage()) {
         const std::string warning =
             RetainedSettings(*storage, protocol.GetInstanceName()).queueSizeWarning();
         if (!warning.empty()) {
@@ -339,15 +349,15 @@ bool PluginSession::write(const std::string& address, const std::string& text, s
         [&] { written = protocol_->WriteTag(found, bytes.empty() ? &none : bytes.data()); });
     if (!written) {
         error = "cannot write " + address + ": " + reasonSince(before);
-    } else {
-        trackWrite(address, kept.empty());
+        return false;
     }
-    if (written && !kept.empty()) {
+    wrote(address, kept.empty());
+    if (!kept.empty()) {
         error = address + " written, but its " + kept;
     } else {
         warnAboutQueueSize(address);
     }
-    return written && kept.empty();
+    return kept.empty();
 }
 
 // The plug-in takes any queue size; the project editor would not have. The
@@ -379,7 +389,7 @@ std::string PluginSession::command(const std::string& line, bool& ok) {
     std::string reply(buffer.data());
     std::string word = line.substr(0, line.find(' '));
     if (known && !replyTellsFailure(word, reply)) {
-        trackCommand(line, kept.empty());
+        commanded(line, kept.empty());
     }
     if (!kept.empty()) {
         ok = false;
@@ -409,10 +419,38 @@ Intake PluginSession::takeToken(Token& token, std::string& error) {
     }
     token.arrived = std::chrono::system_clock::now();
     token.text = stringValue(text.bytes);
-    token.length =
-        static_cast<uint32_t>(length.bytes[0] | length.bytes[1] << 8 | length.bytes[2] << 16 |
-                              static_cast<uint32_t>(length.bytes[3]) << 24);
+    token.length = wordValue(length.bytes);
+    // A zero byte cut the text: the monitor's copy of the same token, if it
+    // saw one, holds the rest.
+    std::string whole;
+    if (token.length > token.text.size() && queue_.oldest(whole) && whole.size() == token.length &&
+        whole.compare(0, token.text.size() + 1, token.text + '\0') == 0) {
+        token.text = whole;
+    }
     return write(kTokenAck, "1", error) ? Intake::Token : Intake::Failed;
+}
+
+FramingSource PluginSession::framingSource() {
+    return [this] { return framing_.get(); };
+}
+
+void PluginSession::follow(std::shared_ptr<host::LineTap> tap) {
+    TagValue count;
+    std::string ignored;
+    // Before the start nothing is queued, and no tag is made yet.
+    queue_.restart(started_ && read(kTokensAvailable, count, ignored) ? wordValue(count.bytes) : 0);
+    if (std::find(taps_.begin(), taps_.end(), tap) == taps_.end()) {
+        taps_.push_back(tap);
+    }
+    host_->serialFactory().attach(tap.get());
+}
+
+void PluginSession::unfollow() {
+    host_->serialFactory().attach(nullptr);
+}
+
+std::vector<host::LinkEvent> PluginSession::lineStates() {
+    return host_->serialFactory().lineStates();
 }
 
 }  // namespace xtok::tools

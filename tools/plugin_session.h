@@ -4,6 +4,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <memory>
 #include <string>
@@ -11,11 +12,14 @@
 
 #include "host/plugin_loader.h"
 #include "host/service_provider.h"
+#include "tools/queue_mirror.h"
 #include "tools/settings_model.h"
 #include "tools/tag_values.h"
 #include "xtokline/constants.h"
 
 namespace xtok::tools {
+
+class PluginSession;
 
 struct SessionOptions {
     std::string pluginPath;
@@ -30,6 +34,11 @@ struct SessionOptions {
     /// Host notices after a successful start; during it they become part of
     /// the start error instead.
     host::Notice notice = host::printNotice;
+    /// Reopen the port's device after a hang-up or failure.
+    bool reconnect = false;
+    /// Called once the plug-in is loaded, before it is configured and
+    /// started: where a line monitor begins in time to see the port open.
+    std::function<void(PluginSession&)> beforeStart;
 };
 
 /// What the session has to tell beside the results of commands: what a reset
@@ -48,8 +57,10 @@ struct TagValue {
 
 /// A received token as the panel sees it.
 struct Token {
-    std::string text;  // rx_token: the stored form up to its first zero byte
-    uint32_t length;   // rx_token_len: the stored form's whole length
+    // The stored form: rx_token gives it up to its first zero byte, the line
+    // monitor's copy whole.
+    std::string text;
+    uint32_t length;  // rx_token_len: the stored form's whole length
     std::chrono::system_clock::time_point arrived;
 };
 
@@ -97,6 +108,16 @@ public:
     /// The messages since the last call.
     std::vector<SessionMessage> takeMessages();
 
+    /// The receive framing and queue limit in force, for a line monitor.
+    FramingSource framingSource();
+    /// The queue as the host sees it; acknowledgements made here count.
+    QueueMirror& queue() { return queue_; }
+    /// `tap` hears the line from now on; it is kept for the session's life.
+    void follow(std::shared_ptr<host::LineTap> tap);
+    void unfollow();
+    /// The latest opening, closing, loss or reconnection of each device.
+    std::vector<host::LinkEvent> lineStates();
+
 private:
     PluginSession() = default;
     bool load(const SessionOptions& options, std::string& error);
@@ -128,11 +149,12 @@ private:
     /// (or nothing is stored), else why they are not.
     template <class Call>
     std::string retaining(Call call);
-    /// Follows a successful write of `address` in the settings model; `kept`
-    /// tells whether what it retains is in the state file.
-    void trackWrite(const std::string& address, bool kept);
+    /// Follows a successful write of `address` in the settings model and
+    /// the queue (settings_tracking.cpp); `kept` tells whether what it
+    /// retains is in the state file.
+    void wrote(const std::string& address, bool kept);
     /// The same for a console line the plug-in carried out.
-    void trackCommand(const std::string& line, bool kept);
+    void commanded(const std::string& line, bool kept);
 
     struct TagDeleter {
         void operator()(ITag* tag) const;
@@ -143,10 +165,14 @@ private:
     std::vector<SessionMessage> messages_;
 
     // Declared in the order of building; destroyed the other way round.
+    FramingState framing_;
+    QueueMirror queue_;
+    std::vector<std::shared_ptr<host::LineTap>> taps_;
     std::shared_ptr<NoticeRelay> relay_;
     std::unique_ptr<host::ServiceProvider> host_;
     std::unique_ptr<host::LoadedPlugin> plugin_;
     IProtocol7* protocol_ = nullptr;
+    bool started_ = false;
     std::map<std::string, std::unique_ptr<ITag, TagDeleter>> tags_;
     SettingsModel settings_;
 };

@@ -164,13 +164,12 @@ void SettingsModel::applied(bool kept) {
     }
 }
 
-Framing SettingsModel::framing() const {
-    Framing framing;
-    framing.rxPrefix = hexTextToBytes(textOf(states_[kRxPrefix].active));
-    framing.rxSuffix = hexTextToBytes(textOf(states_[kRxSuffix].active));
-    framing.gapMs = numberOf(states_[kGap].active);
-    framing.hexTokens = numberOf(states_[kHexTokens].active) != 0;
-    framing.queueSize = numberOf(states_[kTokenQueueSize].active);
+ActiveFraming SettingsModel::framing() const {
+    ActiveFraming framing;
+    framing.rx.prefix = textOf(states_[kRxPrefix].active);
+    framing.rx.suffix = textOf(states_[kRxSuffix].active);
+    framing.rx.gap = numberOf(states_[kGap].active);
+    framing.queueLimit = numberOf(states_[kTokenQueueSize].active);
     return framing;
 }
 

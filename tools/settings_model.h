@@ -12,6 +12,7 @@
 
 #include "protocol/retained_store.h"
 #include "protocol/settings.h"
+#include "tools/active_framing.h"
 
 namespace xtok::tools {
 
@@ -30,16 +31,6 @@ struct SettingState {
     Source source = Source::Default;
     std::optional<StoredValue> staged;    ///< written to its SP_ type, waiting for SP_Done
     std::optional<StoredValue> retained;  ///< in the state file
-};
-
-/// How the receive side cuts tokens now: what a line monitor needs to cut
-/// them as the plug-in does.
-struct Framing {
-    std::string rxPrefix;  ///< bytes
-    std::string rxSuffix;  ///< bytes
-    int32_t gapMs = 0;
-    bool hexTokens = false;
-    int32_t queueSize = 0;
 };
 
 /// The row whose configuration key is `key`, or null.
@@ -70,7 +61,9 @@ public:
     void applied(bool kept);
 
     const SettingState& operator[](SettingId id) const { return states_[id]; }
-    Framing framing() const;
+    /// How the receive side cuts tokens now: what a line monitor needs to
+    /// cut them as the plug-in does.
+    ActiveFraming framing() const;
 
 private:
     struct Held {

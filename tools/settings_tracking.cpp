@@ -1,6 +1,6 @@
-// How the session's writes and console lines move the settings model. The
-// plug-in tells no one what they changed, so the session follows each one
-// that the plug-in carried out.
+// How the session's writes and console lines move the settings model and
+// the queue as the host sees them. The plug-in tells no one what they
+// changed, so the session follows each one that the plug-in carried out.
 #include <algorithm>
 #include <cstring>
 
@@ -45,31 +45,37 @@ StoredValue storedOf(const Setting& setting, const TagValue& value) {
 
 }  // namespace
 
-void PluginSession::trackWrite(const std::string& address, bool kept) {
+void PluginSession::wrote(const std::string& address, bool kept) {
     std::vector<std::string> fields;
     splitTrimmed(address, '?', fields);
     const std::string type = fields.size() > 1 ? fields[1] : "";
-    if (type == kApply) {
-        settings_.applied(kept);
-        return;
-    }
-    // A setting's SP_ read shows its staged value: what the plug-in made of
-    // the written bytes, whatever their type.
     const Setting* setting = findSettingByMemoryType(type);
     TagValue value;
     std::string error;
-    if (setting && read(settingAddress(*setting), value, error)) {
+    if (type == "token_ack") {
+        queue_.acknowledged();
+    } else if (type == kApply) {
+        settings_.applied(kept);
+        queue_.cleared();
+    } else if (setting && read(settingAddress(*setting), value, error)) {
+        // A setting's SP_ read shows its staged value: what the plug-in made
+        // of the written bytes, whatever their type.
         settings_.staged(setting->id, storedOf(*setting, value));
     }
+    framing_.set(settings_.framing());
 }
 
-void PluginSession::trackCommand(const std::string& line, bool kept) {
+// As the plug-in's console splits its words: at each blank.
+void PluginSession::commanded(const std::string& line, bool kept) {
     std::vector<std::string> words;
     splitTrimmed(line, ' ', words);
     if (words[0] == "write" && words.size() == 3) {
-        trackWrite(words[1], kept);
+        wrote(words[1], kept);
+    } else if (words[0] == "token_ack") {
+        words.size() == 2 && words[1] == "all" ? queue_.cleared() : queue_.acknowledged();
     } else {
         settings_.consoleLine(line);
+        framing_.set(settings_.framing());
     }
 }
 

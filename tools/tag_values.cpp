@@ -321,6 +321,10 @@ std::string stringValue(const std::vector<uint8_t>& value) {
     return text.substr(0, text.find('\0'));
 }
 
+uint32_t wordValue(const std::vector<uint8_t>& value) {
+    return value.size() < 4 ? 0 : static_cast<uint32_t>(getLittleEndian(value.data(), 4));
+}
+
 std::string formatValue(const TagShape& shape, const std::vector<uint8_t>& value) {
     std::size_t count = 0;
     Element element = layoutOf(shape, count);

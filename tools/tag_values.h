@@ -41,4 +41,7 @@ std::string formatValueJson(const TagShape& shape, const std::vector<uint8_t>& v
 /// The text of a string value: its bytes up to the first zero byte.
 std::string stringValue(const std::vector<uint8_t>& value);
 
+/// A 32-bit number's value (unsignedInt, int); 0 for a shorter value.
+uint32_t wordValue(const std::vector<uint8_t>& value);
+
 }  // namespace xtok::tools

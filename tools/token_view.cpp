@@ -38,14 +38,18 @@ std::string isoTime(std::chrono::system_clock::time_point when) {
     return format(when, true, "%Y-%m-%dT%H:%M:%S");
 }
 
+std::string bytesView(const std::string& bytes) {
+    std::string view = "\"" + escapeBytes(bytes) + "\"";
+    return bytes.empty() ? view : view + "  " + hexBytes(bytes);
+}
+
 std::string tokenLine(const Token& token) {
-    std::string line = "\"" + escapeBytes(token.text) + "\"";
-    if (!token.text.empty()) {
-        line += "  " + hexBytes(token.text);
-    }
-    line += "  (" + std::to_string(token.length) + (token.length == 1 ? " byte" : " bytes");
+    std::string line = bytesView(token.text) + "  (" + std::to_string(token.length) +
+                       (token.length == 1 ? " byte" : " bytes");
     if (token.length > token.text.size()) {
-        line += ", shown up to its first zero byte";
+        // The plug-in hands a raw token out as text, up to its first zero
+        // byte; only a monitor that saw it framed knows the rest.
+        line += ", shown up to its first zero byte; with the monitor on it shows whole";
     }
     return line + ")";
 }

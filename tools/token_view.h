@@ -13,7 +13,11 @@ std::string clockText(std::chrono::system_clock::time_point when);
 /// UTC "YYYY-MM-DDTHH:MM:SS.mmmZ", for machines.
 std::string isoTime(std::chrono::system_clock::time_point when);
 
-/// `"text"  41 42 43  (3 bytes)`, saying so when a zero byte cut the text.
+/// `"AB\x00"  41 42 00`: the bytes as escaped text, then as hex; `""` for none.
+std::string bytesView(const std::string& bytes);
+
+/// `"text"  41 42 43  (3 bytes)`, saying so when the text is not the whole
+/// token.
 std::string tokenLine(const Token& token);
 
 }  // namespace xtok::tools

@@ -1,11 +1,15 @@
 // Cutting the byte stream into tokens: every framing mode, the signed prefix
 // comparison and the restart rule, the 1000-byte limit, empty tokens, the gap
-// as the read time-out, and a disconnect in the middle of a read.
+// as the read time-out, and a disconnect in the middle of a read. xtok-host's
+// framer, which follows the plug-in from outside, finds the same tokens.
 #include <gtest/gtest.h>
 
+#include <sstream>
 #include <thread>
 
 #include "tests/protocol/protocol_fixture.h"
+#include "tools/token_framer.h"
+#include "xtokline/text.h"
 
 namespace xtok::test {
 namespace {
@@ -82,12 +86,38 @@ const FramingCase kFraming[] = {
     {"BothFramePastAThousandRestarts", kPS, "02 " + k1000 + "03 02 42 03", {"42"}},
 };
 
+/// The tokens of xtok-host's framer fed what `play` plays: each piece of
+/// the script, then a silence of the (default) gap.
+std::vector<std::string> hostFramerTokens(const FramingCase& row) {
+    tools::RxFraming rules;
+    std::istringstream keys(row.keys);
+    for (std::string key; keys >> key;) {
+        (key.rfind("rx_prefix=", 0) == 0 ? rules.prefix : rules.suffix) = key.substr(10);
+    }
+    tools::TokenFramer framer([&] { return rules; });
+    std::vector<std::string> tokens;
+    tools::FramedToken token;
+    std::istringstream pieces(row.script);
+    for (std::string piece; std::getline(pieces, piece, '|');) {
+        for (char c : hexBytes(piece)) {
+            if (framer.byte(static_cast<uint8_t>(c), token)) {
+                tokens.push_back(bytesToHexText(token.bytes.data(), token.bytes.size()));
+            }
+        }
+        if (framer.silence(500, token)) {
+            tokens.push_back(bytesToHexText(token.bytes.data(), token.bytes.size()));
+        }
+    }
+    return tokens;
+}
+
 class Framing : public ProtocolFixture, public ::testing::WithParamInterface<FramingCase> {};
 
 TEST_P(Framing, QueuesTheTokens) {
     ASSERT_TRUE(start(std::string("hex_tokens=true ") + GetParam().keys)) << error();
     play(GetParam().script);
     EXPECT_EQ(takeTokens(), GetParam().tokens);
+    EXPECT_EQ(hostFramerTokens(GetParam()), GetParam().tokens);
 }
 
 INSTANTIATE_TEST_SUITE_P(Rows, Framing, ::testing::ValuesIn(kFraming),

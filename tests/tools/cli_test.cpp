@@ -304,9 +304,12 @@ TEST_F(Session, SettingsTellWhereEachActiveValueCameFrom) {
         runTool(run({"--json", "--exec",
                      "set_rxPrefix 05; tag write 0?SP_TokenQueueSize?unsignedInt 50; "
                      "settings; tag write 0?SP_Done?boolean 1; settings; "
+                     // A pass still hunting the console's prefix would drop the
+                     // answer: a close ends it.
+                     "connect OFF; connect ON; "
                      "tag write 0?tx_token?string-8 HI; watch --count 1 --timeout 10"}));
     std::vector<std::string> lines = linesOf(done.out);
-    ASSERT_EQ(lines.size(), 8u) << done.out << done.err;
+    ASSERT_EQ(lines.size(), 10u) << done.out << done.err;
     auto setting = [](const char* type, const std::string& rest) {
         return std::string("\"") + type + "\":{\"key\":" + rest;
     };
@@ -326,7 +329,7 @@ TEST_F(Session, SettingsTellWhereEachActiveValueCameFrom) {
         // SP_Done returns a console change to the starting value.
         {lines[4],
          setting("SP_RxPrefix", "\"rx_prefix\",\"active\":\"02\",\"source\":\"configuration\"")},
-        {lines[6], "\"token\":\"ACK HI\""},
+        {lines[8], "\"token\":\"ACK HI\""},
     };
     for (const auto& [line, part] : kSeen) {
         EXPECT_NE(line.find(part), std::string::npos) << part << "\n" << line;
@@ -422,6 +425,89 @@ TEST_F(Session, TheTerminalIsLeftAsItWasHoweverTheRunEnds) {
         EXPECT_EQ(done.status, c.status) << c.what << ": " << done.err;
         EXPECT_EQ(terminal.settings(), before) << c.what;
     }
+}
+
+// The monitor beside the console: tokens with zero bytes and the rule that
+// ended each, the framing changed by a console setter on the way (a new pass
+// takes it: the port is closed and opened around it), and watch showing such
+// a token whole.
+TEST_F(Session, MonitorShowsEachTokenWithWhatEndedIt) {
+    Subprocess session(run({"--json", "--exec",
+                            "monitor on; watch --count 1 --timeout 10; connect OFF; "
+                            "set_rxSuffix none; connect ON; watch --count 2 --timeout 10"}));
+    ASSERT_TRUE(session.waitForOutput("\"monitor\":true", 5s));
+    device_->sendRaw(std::string("\2A\0B\3", 5));
+    ASSERT_TRUE(session.waitForOutput("\"reply\":\"OK\"", 5s, 3));
+    device_->sendRaw(std::string("\2C\0\2D", 5));
+    Finished done = session.finish(10s);
+    EXPECT_EQ(done.status, 0) << done.err;
+    for (const char* shown :
+         {"{\"event\":\"rx\",\"time\":\"", "\"end\":\"suffix\",\"hex\":\"410042\"",
+          "\"end\":\"next prefix\",\"hex\":\"4300\"", "\"end\":\"gap\",\"hex\":\"44\"",
+          "\"token\":\"A\\u0000B\",\"length\":3,\"hex\":\"410042\"}",
+          "\"token\":\"C\\u0000\",\"length\":2,\"hex\":\"4300\"}"}) {
+        EXPECT_NE(done.out.find(shown), std::string::npos) << shown << "\n" << done.out;
+    }
+}
+
+TEST_F(Session, MonitorEndsAtItsCountAndLogsWhatItShows) {
+    std::vector<std::string> arguments =
+        run({"--json", "--count", "2", "--log", dir_.file("line.log")});
+    arguments[1] = "monitor";
+    arguments[3] += " token_queue_size=1";
+    Subprocess monitor(arguments);
+    ASSERT_TRUE(monitor.waitForOutput("settings applied", 5s));
+    device_->sendRaw(std::string("\x02\0\x03\x02Z\x03", 6));  // nobody takes the first
+    Finished done = monitor.finish(10s);
+    EXPECT_EQ(done.status, 0) << done.err;
+    std::vector<std::string> events;
+    for (const std::string& line : linesOf(done.out)) {
+        if (line.find("\"rx\"") == std::string::npos) {
+            events.push_back(line.substr(0, line.find(",\"time\"")) +
+                             line.substr(line.find('"', line.find(",\"time\"") + 9) + 1));
+        }
+    }
+    const std::string device = line_->slavePath();
+    EXPECT_EQ(
+        events,
+        (std::vector<std::string>{
+            "{\"event\":\"link\",\"link\":\"opened\",\"device\":\"" + device + "\"}",
+            "{\"event\":\"link\",\"link\":\"settings applied\",\"device\":\"" + device +
+                "\",\"settings\":\"9600,none,8,1,RS-232\"}",
+            "{\"event\":\"token\",\"end\":\"suffix\",\"hex\":\"00\",\"text\":\"\\u0000\","
+            "\"length\":1}",
+            "{\"event\":\"token\",\"end\":\"suffix\",\"hex\":\"5A\",\"text\":\"Z\",\"length\":1}",
+            "{\"event\":\"queue\",\"limit\":1,\"droppedSoFar\":1}"}))
+        << done.out;
+    std::ifstream log(dir_.file("line.log"));
+    EXPECT_EQ(std::string(std::istreambuf_iterator<char>(log), {}), done.out);
+}
+
+// A device that goes away and comes back at the same path: the monitor says
+// so, reception goes on, and info tells the line's state.
+TEST_F(Session, ALostDeviceIsReopenedWhenItComesBack) {
+    const std::string link = dir_.file("ttyLINK");
+    ASSERT_EQ(symlink(line_->slavePath().c_str(), link.c_str()), 0);
+    std::vector<std::string> arguments =
+        run({"--reconnect", "--json", "--exec", "monitor on; watch --count 1 --timeout 20; info"});
+    arguments[3] = configFor(link);
+    Subprocess session(arguments);
+    ASSERT_TRUE(session.waitForOutput("\"monitor\":true", 5s));
+    device_.reset();
+    line_->closeMaster();
+    ASSERT_TRUE(session.waitForOutput("\"link\":\"lost\"", 5s));
+    std::string error;
+    std::unique_ptr<PtyPair> back = PtyPair::open(error);
+    ASSERT_NE(back, nullptr) << error;
+    ASSERT_EQ(unlink(link.c_str()), 0);
+    ASSERT_EQ(symlink(back->slavePath().c_str(), link.c_str()), 0);
+    ASSERT_TRUE(session.waitForOutput("\"link\":\"reconnected\"", 5s));
+    ASSERT_EQ(write(back->master(), "\x02R\x03", 3), 3);
+    Finished done = session.finish(10s);
+    EXPECT_EQ(done.status, 0) << done.err;
+    EXPECT_NE(done.out.find("\"reason\":\"hang-up\""), std::string::npos) << done.out;
+    EXPECT_NE(done.out.find("\"token\":\"R\""), std::string::npos) << done.out;
+    EXPECT_NE(done.out.find("line: " + link + " reconnected at "), std::string::npos) << done.out;
 }
 
 TEST(Cli, DescribeShowsTheNineteenMemoryTypesAndTheWholeXml) {
@@ -595,6 +681,15 @@ const BadInput kBadInputs[] = {
     {"configuration FIFO", {"run", "--config", "@{dir}/fifo"}, "is a FIFO", 2},
     {"configuration directory", {"run", "--config", "@{dir}"}, "is a directory", 2},
     {"configuration device", {"run", "--config", "@/dev/zero"}, "is a device", 2},
+    {"log file cannot be opened",
+     {"monitor", "--config", kNoPort + " port={line}", "--log", "{dir}/none/line.log"},
+     "cannot open the log",
+     2},
+    {"monitor count of zero", {"monitor", "--count", "0", "--config", kNoPort}, "above 0", 2},
+    {"monitor switched to nonsense",
+     {"run", "--config", kNoPort + " port={line}", "--exec", "monitor maybe"},
+     "use monitor on",
+     1},
 };
 
 class BadInputs : public ::testing::Test {
@@ -640,7 +735,7 @@ protected:
         for (const std::string& argument : input.arguments) {
             result.push_back(substituted(argument));
         }
-        if (input.arguments[0] == "run") {
+        if (input.arguments[0] == "run" || input.arguments[0] == "monitor") {
             // A state file of its own for a child run as nobody: root's is not
             // for it to write.
             result.insert(

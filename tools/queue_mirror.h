@@ -1,0 +1,39 @@
+// The plug-in's token queue as xtok-host sees it from outside: the tokens its
+// line monitor saw framed and the acknowledgements the host itself made. It
+// lets the monitor say when a full queue drops its oldest token, and lets a
+// token with a zero byte be shown whole, which the plug-in's rx_token cannot.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <deque>
+#include <mutex>
+#include <string>
+
+namespace xtok::tools {
+
+class QueueMirror {
+public:
+    /// A token framed while `limit` is in force. True when the plug-in drops
+    /// its oldest token for it; `dropped` is then the count so far.
+    bool framed(const std::string& bytes, int32_t limit, long& dropped);
+    /// The host removed the oldest token (token_ack).
+    void acknowledged();
+    /// The queue was emptied (SP_Done, "token_ack all").
+    void cleared();
+    /// `count` tokens wait whose bytes the monitor did not see.
+    void restart(long count);
+    /// The oldest token's received bytes, when the monitor saw them framed.
+    bool oldest(std::string& bytes) const;
+
+private:
+    void removeOldest();
+
+    mutable std::mutex mutex_;
+    long count_ = 0;
+    long dropped_ = 0;
+    // Copies of the newest tokens, at most kKept of them.
+    std::deque<std::string> newest_;
+};
+
+}  // namespace xtok::tools
