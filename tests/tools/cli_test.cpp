@@ -83,38 +83,117 @@ protected:
     std::unique_ptr<SimulatedDevice> device_;
 };
 
-TEST_F(Session, ScriptedRunReadsWritesAndWatches) {
-    Finished done = runTool(run({"--exec",
-                                 "tag write 0?tx_token?string-16 HELLO;"
-                                 " watch --count 1 --timeout 10;"
-                                 " tag read 0?tokens_available?unsignedInt;"
-                                 " tag write 0?SP_Baud?unsignedInt 19200;"
-                                 " tag read 0?SP_Baud?unsignedInt; get_stat"}));
-    EXPECT_EQ(done.status, 0) << done.err;
-    std::vector<std::string> lines = linesOf(done.out);
-    ASSERT_EQ(lines.size(), 6u) << done.out;
-    EXPECT_EQ(lines[0], "ok");
-    EXPECT_NE(lines[1].find("\"ACK HELLO\"  41 43 4B 20 48 45 4C 4C 4F  (9 bytes)"),
-              std::string::npos)
-        << lines[1];
-    EXPECT_EQ(lines[2], "0");
-    EXPECT_EQ(lines[3], "ok");
-    EXPECT_EQ(lines[4], "19200");
-    EXPECT_EQ(lines[5], "Connected");
-    EXPECT_EQ(device_->tokens(), std::vector<std::string>{"HELLO"});
+// A run over the simulated device as a user scripts it: its options, the
+// script (" || " between runs on the same state file; "<" first: standard
+// input), and what standard output and standard error hold, in order.
+struct Script {
+    const char* name;
+    std::vector<std::string> options;
+    const char* script;
+    std::vector<std::string> out, err;
+    int status;
+};
+
+const Script kScripts[] = {
+    {"ReadsWritesAndWatches",
+     {},
+     "tag write 0?tx_token?string-16 HELLO; watch --count 1 --timeout 10; "
+     "tag read 0?tokens_available?unsignedInt; tag write 0?SP_Baud?unsignedInt 19200; "
+     "tag read 0?SP_Baud?unsignedInt; get_stat",
+     {"ok\n", "  \"ACK HELLO\"  41 43 4B 20 48 45 4C 4C 4F  (9 bytes)\n0\nok\n19200\nConnected\n"},
+     {},
+     0},
+    // However long the gap, a close and the end come within about half a
+    // second (the run's deadline would end a wait of ten minutes): the wait
+    // for silence is read in slices.
+    {"ALongGapDelaysNoClose",
+     {},
+     "tag write 0?SP_Gap?unsignedInt 600000; tag write 0?SP_Done?boolean 1; connect OFF; get_stat",
+     {"ok\nok\nOK\nDisconnected\n"},
+     {},
+     0},
+    {"RetainedSettingsSurviveARestart",
+     {},
+     "tag write 0?SP_Baud?unsignedInt 19200; tag write 0?SP_RxSuffix?string-8 0D0A; "
+     "tag write 0?SP_Done?boolean 1 || tag read 0?SP_Baud?unsignedInt; "
+     "tag read 0?SP_RxSuffix?string-8",
+     {"ok\nok\nok\n19200\n\"0D0A\"\n"},
+     {},
+     0},
+    // The console answers most failures in its reply text, with a "known
+    // command" result: those count as failures all the same.
+    {"AScriptOnStandardInputGoesOnAfterAFailure",
+     {},
+     "<get_stat\n# a comment\ntag read 0?nope?int\n\nread 0?SP_Baud?unsignedInt\n"
+     "write 0?SP_Baud?unsignedInt 80\nset_hexToken maybe\nconnect OFF\nget_stat\nquit\nget_stat\n",
+     {"Connected\n80250000\nOK\nDisconnected\n"},
+     {"error: bad tag address '0?nope?int': Can't access memory type\n",
+      "error: write: incorrect length of data to write\nerror: set_hexToken: wrong value\n"},
+     1},
+    {"JsonGivesOneObjectPerResult",
+     {"--json"},
+     "tag write 0?tx_token?string-16 \"A\\x01\"; watch --count 1 --timeout 10; settings; "
+     "tag read 0?nope?int; help datatypes; help memorytypes",
+     {"{\"command\":\"tag write", "\"token\":\"ACK A\\u0001\",\"length\":6",
+      "\"ok\":true,\"tokens\":1}\n", "\"SP_Baud\":{\"key\":\"baudrate\",\"active\":9600",
+      "\"ok\":false,\"error\":\"bad tag address", "\"datatypes\":[\"boolean\",\"byte\"",
+      "\"string-N\",\"binary-N\",\"time\"", "{\"name\":\"SP_Done\",\"type\":\"boolean\""},
+     {},
+     1},
+    // The console's setters and the SP_ writes pass through xtok-host, which
+    // follows them; what it says is active is what the plug-in then receives
+    // by. SP_Done returns a console change to the starting value; a pass still
+    // hunting the console's prefix would drop the answer: a close ends it.
+    {"SettingsTellWhereEachActiveValueCameFrom",
+     {"--json"},
+     "tag write 0?SP_Gap?unsignedInt 70; tag write 0?SP_Done?boolean 1 || set_rxPrefix 05; "
+     "tag write 0?SP_TokenQueueSize?unsignedInt 50; settings; tag write 0?SP_Done?boolean 1; "
+     "settings; connect OFF; connect ON; tag write 0?tx_token?string-8 HI; "
+     "watch --count 1 --timeout 10",
+     {"\"SP_Baud\":{\"key\":\"baudrate\",\"active\":9600,\"source\":\"configuration\"",
+      "\"SP_RxPrefix\":{\"key\":\"rx_prefix\",\"active\":\"05\",\"source\":\"console\"",
+      "\"SP_Gap\":{\"key\":\"gap\",\"active\":70,\"source\":\"retained file\","
+      "\"staged\":null,\"retained\":70}",
+      "\"SP_TokenQueueSize\":{\"key\":\"token_queue_size\",\"active\":100,"
+      "\"source\":\"default\",\"staged\":50,\"retained\":null}",
+      "\"SP_RxPrefix\":{\"key\":\"rx_prefix\",\"active\":\"02\",\"source\":\"configuration\"",
+      "\"SP_TokenQueueSize\":{\"key\":\"token_queue_size\",\"active\":50,"
+      "\"source\":\"SP_ write\",\"staged\":50,\"retained\":50}",
+      "\"token\":\"ACK HI\""},
+     {},
+     0},
+};
+
+class Scripts : public Session, public ::testing::WithParamInterface<Script> {};
+
+TEST_P(Scripts, ShowWhatTheyShould) {
+    const Script& script = GetParam();
+    Finished done;
+    std::string out, err, runs = script.script;
+    for (std::size_t at = 0, end = 0; end != std::string::npos; at = end + 4) {
+        end = runs.find(" || ", at);
+        const std::string steps = runs.substr(at, end - at);
+        std::vector<std::string> options = script.options;
+        if (steps[0] != '<') {
+            options.insert(options.end(), {"--exec", steps});
+        }
+        done = runTool(run(options), steps[0] == '<' ? steps.substr(1) : "");
+        out += done.out;
+        err += done.err;
+    }
+    EXPECT_EQ(done.status, script.status) << err;
+    for (const auto& [text, parts] : {std::pair{out, script.out}, {err, script.err}}) {
+        std::size_t at = 0;
+        for (const std::string& part : parts) {
+            at = text.find(part, at);
+            ASSERT_NE(at, std::string::npos) << part << "\nnot in order in\n" << text;
+        }
+    }
+    EXPECT_TRUE(script.err.size() || err.empty()) << err;
 }
 
-// However long the gap, a close and the end of the run come within about
-// half a second: the wait for silence is read in slices.
-TEST_F(Session, ALongGapDelaysNoClose) {
-    const auto began = std::chrono::steady_clock::now();
-    Finished done = runTool(run({"--exec",
-                                 "tag write 0?SP_Gap?unsignedInt 30000; "
-                                 "tag write 0?SP_Done?boolean 1; connect OFF; get_stat"}));
-    EXPECT_EQ(done.status, 0) << done.err;
-    EXPECT_EQ(linesOf(done.out).back(), "Disconnected");
-    EXPECT_LT(std::chrono::steady_clock::now() - began, 5s);
-}
+INSTANTIATE_TEST_SUITE_P(Run, Scripts, ::testing::ValuesIn(kScripts),
+                         [](const auto& info) { return std::string(info.param.name); });
 
 // SP_Done retains its settings in one transaction: a run killed at any
 // moment leaves the whole old set or the whole new set in the state file.
@@ -157,17 +236,6 @@ TEST_F(Session, ALockedStateFileFailsOnlyWhatItMustKeep) {
     EXPECT_EQ(done.err,
               "error: 0?SP_Done?boolean written, but its settings are not retained: database "
               "is locked\n");
-}
-
-// SP_Done keeps the settings in the state file: the next run starts with them.
-TEST_F(Session, RetainedSettingsSurviveARestart) {
-    Finished done = runTool(run({"--exec",
-                                 "tag write 0?SP_Baud?unsignedInt 19200; tag write "
-                                 "0?SP_RxSuffix?string-8 0D0A; tag write 0?SP_Done?boolean 1"}));
-    EXPECT_EQ(done.status, 0) << done.err;
-    done =
-        runTool(run({"--exec", "tag read 0?SP_Baud?unsignedInt; tag read 0?SP_RxSuffix?string-8"}));
-    EXPECT_EQ(done.out, "19200\n\"0D0A\"\n") << done.err;
 }
 
 // Line settings retained in the state file that the port refuses do not
@@ -223,30 +291,6 @@ TEST_F(Session, CtrlCEndsAWatchAndTheScriptGoesOn) {
     EXPECT_EQ(linesOf(done.out).back(), "Connected") << done.out;
 }
 
-TEST_F(Session, JsonGivesOneObjectPerResult) {
-    Finished done = runTool(run({"--json", "--exec",
-                                 "tag write 0?tx_token?string-16 \"A\\x01\"; watch --count 1 "
-                                 "--timeout 10; settings; tag read 0?nope?int; help datatypes; "
-                                 "help memorytypes"}));
-    EXPECT_EQ(done.status, 1);
-    std::vector<std::string> lines = linesOf(done.out);
-    ASSERT_EQ(lines.size(), 7u) << done.out;
-    for (const std::string& line : lines) {
-        EXPECT_TRUE(line.front() == '{' && line.back() == '}') << line;
-    }
-    EXPECT_NE(lines[1].find("\"token\":\"ACK A\\u0001\",\"length\":6"), std::string::npos)
-        << lines[1];
-    EXPECT_NE(lines[2].find("\"ok\":true,\"tokens\":1"), std::string::npos) << lines[2];
-    EXPECT_NE(lines[3].find("\"SP_Baud\":{\"key\":\"baudrate\",\"active\":9600"), std::string::npos)
-        << lines[3];
-    EXPECT_NE(lines[4].find("\"ok\":false,\"error\":\"bad tag address"), std::string::npos)
-        << lines[4];
-    EXPECT_NE(lines[5].find("\"datatypes\":[\"boolean\",\"byte\""), std::string::npos);
-    EXPECT_NE(lines[5].find("\"string-N\",\"binary-N\",\"time\""), std::string::npos);
-    EXPECT_NE(lines[6].find("{\"name\":\"SP_Done\",\"type\":\"boolean\""), std::string::npos);
-    EXPECT_EQ(done.err, "");
-}
-
 // Each option of the short form sets what its key in a configuration text
 // sets; without options the editor's defaults make the line.
 TEST_F(Session, EachOptionSetsWhatItsKeyDoes) {
@@ -291,65 +335,6 @@ TEST_F(Session, EachOptionSetsWhatItsKeyDoes) {
         EXPECT_EQ(byOption, settingsWith({"--config", text(key)})) << key;
         EXPECT_NE(byOption, defaults) << key;
     }
-}
-
-// The console's setters and the SP_ writes pass through xtok-host, which
-// follows them; what it says is active is what the plug-in then receives by.
-TEST_F(Session, SettingsTellWhereEachActiveValueCameFrom) {
-    std::string error;
-    auto storage = host::PermanentStorage::open(dir_.file("retained.sqlite3"), error);
-    ASSERT_TRUE(storage && storage->WriteInt("XTOK", "gap", 70)) << error;
-    storage.reset();
-    Finished done =
-        runTool(run({"--json", "--exec",
-                     "set_rxPrefix 05; tag write 0?SP_TokenQueueSize?unsignedInt 50; "
-                     "settings; tag write 0?SP_Done?boolean 1; settings; "
-                     // A pass still hunting the console's prefix would drop the
-                     // answer: a close ends it.
-                     "connect OFF; connect ON; "
-                     "tag write 0?tx_token?string-8 HI; watch --count 1 --timeout 10"}));
-    std::vector<std::string> lines = linesOf(done.out);
-    ASSERT_EQ(lines.size(), 10u) << done.out << done.err;
-    auto setting = [](const char* type, const std::string& rest) {
-        return std::string("\"") + type + "\":{\"key\":" + rest;
-    };
-    const std::pair<std::string, std::string> kSeen[] = {
-        {lines[2], setting("SP_Baud", "\"baudrate\",\"active\":9600,\"source\":\"configuration\"")},
-        {lines[2], setting("SP_Gap",
-                           "\"gap\",\"active\":70,\"source\":\"retained file\","
-                           "\"staged\":null,\"retained\":70}")},
-        {lines[2],
-         setting("SP_RxPrefix", "\"rx_prefix\",\"active\":\"05\",\"source\":\"console\"")},
-        {lines[2], setting("SP_TokenQueueSize",
-                           "\"token_queue_size\",\"active\":100,"
-                           "\"source\":\"default\",\"staged\":50,\"retained\":null}")},
-        {lines[4], setting("SP_TokenQueueSize",
-                           "\"token_queue_size\",\"active\":50,"
-                           "\"source\":\"SP_ write\",\"staged\":50,\"retained\":50}")},
-        // SP_Done returns a console change to the starting value.
-        {lines[4],
-         setting("SP_RxPrefix", "\"rx_prefix\",\"active\":\"02\",\"source\":\"configuration\"")},
-        {lines[8], "\"token\":\"ACK HI\""},
-    };
-    for (const auto& [line, part] : kSeen) {
-        EXPECT_NE(line.find(part), std::string::npos) << part << "\n" << line;
-    }
-}
-
-TEST_F(Session, AScriptOnStandardInputGoesOnAfterAFailureAndSaysSoAtTheEnd) {
-    // The plug-in's console answers most failures in its reply text, with a
-    // "known command" result: those count as failures all the same.
-    Finished done = runTool(run({}),
-                            "get_stat\n# a comment\ntag read 0?nope?int\n\n"
-                            "read 0?SP_Baud?unsignedInt\nwrite 0?SP_Baud?unsignedInt 80\n"
-                            "set_hexToken maybe\nconnect OFF\nget_stat\nquit\nget_stat\n");
-    EXPECT_EQ(done.status, 1);
-    EXPECT_EQ(done.out, "Connected\n80250000\nOK\nDisconnected\n");
-    EXPECT_EQ(
-        linesOf(done.err),
-        (std::vector<std::string>{"error: bad tag address '0?nope?int': Can't access memory type",
-                                  "error: write: incorrect length of data to write",
-                                  "error: set_hexToken: wrong value"}));
 }
 
 /// A pseudo-terminal as a person's terminal: cooked, as a shell leaves it.
@@ -600,7 +585,7 @@ TEST(Cli, TheCompletionScriptOffersTheCommandsAndTheirOptions) {
 // retains parity even.
 struct BadInput {
     const char* what;
-    std::vector<std::string> arguments;
+    const char* arguments;  ///< separated by '|'; {np} is kNoPort
     const char* reason;
     int status;
     bool asNobody = false;
@@ -610,86 +595,52 @@ const std::string kNoPort =
     "CfgVer=1 model=1 baudrate=9600 parity=none bits=8 stopbits=1 mode=RS-232";
 
 const BadInput kBadInputs[] = {
-    {"missing device", {"run", "--config", kNoPort + " port={dir}/ttyNONE"}, "No such file", 1},
-    {"unknown port name", {"run", "--config", kNoPort + " port=com17"}, "unknown port name", 2},
-    {"busy port", {"run", "--config", kNoPort + " port={busy}"}, "in use by another program", 1},
-    {"no permission",
-     {"run", "--config", kNoPort + " port={locked}"},
-     "Permission denied",
-     1,
-     true},
-    {"no port in the configuration",
-     {"run", "--config", kNoPort},
-     "missing mandatory key 'port'",
-     2},
-    {"no device", {"run"}, "name the device", 2},
-    {"bad parity",
-     {"run", "--config",
-      "CfgVer=1 model=1 port={line} baudrate=9600 parity=EVEN bits=8 stopbits=1 mode=RS-232"},
-     "parity 'EVEN' is not one of none, even, odd",
-     2},
-    {"misspelled key",
-     {"run", "--config", kNoPort + " port={line} baudrat=9600"},
-     "unknown key 'baudrat'; did you mean 'baudrate'?",
-     2},
-    {"part of a key", {"run", "--config", kNoPort + " port={line} suffix=03"}, "'rx_suffix'?", 2},
-    {"misspelled option",
-     {"run", "{line}", "--baudrat", "9600"},
-     "unknown option '--baudrat'; did you mean '--baudrate'?",
-     2},
-    {"blank in a value", {"run", "{line}", "--prefix", "02 gap=9"}, "cannot be written", 2},
-    {"no configuration at all", {"run", "--config", "hello"}, "unknown format", 2},
+    {"missing device", "run|--config|{np} port={dir}/ttyNONE", "No such file", 1},
+    {"unknown port name", "run|--config|{np} port=com17", "unknown port name", 2},
+    {"busy port", "run|--config|{np} port={busy}", "in use by another program", 1},
+    {"no permission", "run|--config|{np} port={locked}", "Permission denied", 1, true},
+    {"no port in the configuration", "run|--config|{np}", "missing mandatory key 'port'", 2},
+    {"no device", "run", "name the device", 2},
+    {"bad parity", "run|{line}|--parity|EVEN", "parity 'EVEN' is not one of none, even, odd", 2},
+    {"misspelled key", "run|--config|{np} port={line} baudrat=9600",
+     "unknown key 'baudrat'; did you mean 'baudrate'?", 2},
+    {"part of a key", "run|--config|{np} port={line} suffix=03", "'rx_suffix'?", 2},
+    {"misspelled option", "run|{line}|--baudrat|9600",
+     "unknown option '--baudrat'; did you mean '--baudrate'?", 2},
+    {"blank in a value", "run|{line}|--prefix|02 gap=9", "cannot be written", 2},
+    {"no configuration at all", "run|--config|hello", "unknown format", 2},
     // Refused whatever is retained: the run does not start disconnected.
-    {"configured baud rate the port lacks",
-     {"run", "--config",
-      "CfgVer=1 model=1 port={line} baudrate=14400 parity=none bits=8 stopbits=1 mode=RS-232"},
-     "cannot start: {line}: baud rate 14400 is not supported",
-     1},
-    {"bad tag address",
-     {"run", "--config", kNoPort + " port={line}", "--exec", "tag read 0?x?int"},
-     "bad tag address '0?x?int'",
-     1},
-    {"bad typed value",
-     {"run", "--config", kNoPort + " port={line}", "--exec",
-      "tag write 0?SP_Baud?unsignedInt fast"},
-     "'fast' is not a number",
-     1},
-    {"text as plug-in", {"run", "--plugin", "{text}", "{line}"}, "no description block", 1},
-    {"text described", {"describe", "{text}"}, "no description block", 1},
-    {"missing plug-in", {"describe", "{dir}/none.so"}, "No such file", 1},
-    {"unknown command", {"bogus"}, "unknown command 'bogus'", 2},
-    {"unknown option", {"demo", "--colour"}, "--colour", 2},
-    {"count of zero", {"demo", "--count", "0"}, "whole number above 0", 2},
-    {"watch count of zero",
-     {"run", "--config", kNoPort + " port={line}", "--exec", "watch --count 0"},
-     "--count",
-     1},
-    {"bad port map", {"run", "{line}", "--map", "com99=/dev/x"}, "comN=DEVICE", 2},
-    {"configuration file missing", {"run", "--config", "@{dir}/none.cfg"}, "cannot read", 2},
+    {"configured baud rate the port lacks", "run|{line}|--parity|none|--baud|14400",
+     "cannot start: {line}: baud rate 14400 is not supported", 1},
+    {"bad tag address", "run|--config|{np} port={line}|--exec|tag read 0?x?int",
+     "bad tag address '0?x?int'", 1},
+    {"bad typed value", "run|--config|{np} port={line}|--exec|tag write 0?SP_Baud?unsignedInt fast",
+     "'fast' is not a number", 1},
+    {"text as plug-in", "run|--plugin|{text}|{line}", "no description block", 1},
+    {"text described", "describe|{text}", "no description block", 1},
+    {"missing plug-in", "describe|{dir}/none.so", "No such file", 1},
+    {"unknown command", "bogus", "unknown command 'bogus'", 2},
+    {"unknown option", "demo|--colour", "--colour", 2},
+    {"count of zero", "demo|--count|0", "whole number above 0", 2},
+    {"watch count of zero", "run|--config|{np} port={line}|--exec|watch --count 0", "--count", 1},
+    {"bad port map", "run|{line}|--map|com99=/dev/x", "comN=DEVICE", 2},
+    {"configuration file missing", "run|--config|@{dir}/none.cfg", "cannot read", 2},
     {"queue size below the editor's range",
-     {"run", "--config", kNoPort + " port={line}", "--exec",
-      "tag write 0?SP_TokenQueueSize?unsignedInt 0"},
-     "warning: SP_TokenQueueSize 0 lies outside the project editor's range 1 to 10000",
-     0},
+     "run|--config|{np} port={line}|--exec|tag write 0?SP_TokenQueueSize?unsignedInt 0",
+     "warning: SP_TokenQueueSize 0 lies outside the project editor's range 1 to 10000", 0},
     {"queue size above the editor's range",
-     {"run", "--config", kNoPort + " port={line}", "--exec",
-      "tag write 0?SP_TokenQueueSize?unsignedInt 10001"},
-     "SP_TokenQueueSize 10001 lies outside",
-     0},
-    {"configuration file too large", {"run", "--config", "@{dir}/big.cfg"}, "at most 1 MiB", 2},
-    {"configuration file with a zero byte", {"run", "--config", "@{dir}/zero.cfg"}, "zero byte", 2},
-    {"configuration FIFO", {"run", "--config", "@{dir}/fifo"}, "is a FIFO", 2},
-    {"configuration directory", {"run", "--config", "@{dir}"}, "is a directory", 2},
-    {"configuration device", {"run", "--config", "@/dev/zero"}, "is a device", 2},
-    {"log file cannot be opened",
-     {"monitor", "--config", kNoPort + " port={line}", "--log", "{dir}/none/line.log"},
-     "cannot open the log",
-     2},
-    {"monitor count of zero", {"monitor", "--count", "0", "--config", kNoPort}, "above 0", 2},
-    {"monitor switched to nonsense",
-     {"run", "--config", kNoPort + " port={line}", "--exec", "monitor maybe"},
-     "use monitor on",
-     1},
+     "run|--config|{np} port={line}|--exec|tag write 0?SP_TokenQueueSize?unsignedInt 10001",
+     "SP_TokenQueueSize 10001 lies outside", 0},
+    {"configuration file too large", "run|--config|@{dir}/big.cfg", "at most 1 MiB", 2},
+    {"configuration file with a zero byte", "run|--config|@{dir}/zero.cfg", "zero byte", 2},
+    {"configuration FIFO", "run|--config|@{dir}/fifo", "is a FIFO", 2},
+    {"configuration directory", "run|--config|@{dir}", "is a directory", 2},
+    {"configuration device", "run|--config|@/dev/zero", "is a device", 2},
+    {"log file cannot be opened", "monitor|--config|{np} port={line}|--log|{dir}/none/line.log",
+     "cannot open the log", 2},
+    {"monitor count of zero", "monitor|--count|0|--config|{np}", "above 0", 2},
+    {"monitor switched to nonsense", "run|--config|{np} port={line}|--exec|monitor maybe",
+     "use monitor on", 1},
 };
 
 class BadInputs : public ::testing::Test {
@@ -717,7 +668,8 @@ protected:
 
     /// `text` with the placeholders filled in.
     std::string substituted(std::string text) const {
-        const std::map<std::string, std::string> values = {{"{line}", line_->slavePath()},
+        const std::map<std::string, std::string> values = {{"{np}", kNoPort},
+                                                           {"{line}", line_->slavePath()},
                                                            {"{busy}", busy_->slavePath()},
                                                            {"{locked}", dir_.file("locked")},
                                                            {"{text}", dir_.file("notes.txt")},
@@ -732,10 +684,12 @@ protected:
 
     std::vector<std::string> arguments(const BadInput& input) {
         std::vector<std::string> result = {kHost};
-        for (const std::string& argument : input.arguments) {
-            result.push_back(substituted(argument));
+        const std::string all = input.arguments;
+        for (std::size_t at = 0, bar = 0; bar != std::string::npos; at = bar + 1) {
+            bar = all.find('|', at);
+            result.push_back(substituted(all.substr(at, bar - at)));
         }
-        if (input.arguments[0] == "run" || input.arguments[0] == "monitor") {
+        if (result[1] == "run" || result[1] == "monitor") {
             // A state file of its own for a child run as nobody: root's is not
             // for it to write.
             result.insert(
