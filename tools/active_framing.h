@@ -2,8 +2,6 @@
 // the line monitor needs to follow the plug-in's framing from outside.
 #pragma once
 
-#include <chrono>
-#include <condition_variable>
 #include <cstdint>
 #include <functional>
 #include <mutex>
@@ -22,19 +20,15 @@ struct ActiveFraming {
 /// from what the host knows and never asks the plug-in.
 using FramingSource = std::function<ActiveFraming()>;
 
-/// The source a session fills from its settings model after each change,
-/// for the receive task's thread to read.
+/// The source a session fills from its settings model, before the start and
+/// after each change, for the receive task's thread to read.
 class FramingState {
 public:
-    /// Waits (up to two seconds) for the first set(): the receive task may
-    /// begin before the session knows what is in force.
     ActiveFraming get() const;
     void set(const ActiveFraming& framing);
 
 private:
     mutable std::mutex mutex_;
-    mutable std::condition_variable known_;
-    bool set_ = false;
     ActiveFraming framing_;
 };
 

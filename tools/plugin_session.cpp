@@ -116,6 +116,13 @@ bool PluginSession::configureAndStart(std::string& error) {
     }
     const std::string configured = serialSettings();
     const int refusals = host_->serialFactory().refusals();
+    // What Start makes active, known before the receive task asks for it.
+    settings_ = SettingsModel();
+    settings_.configured(config_);
+    if (host::PermanentStorage* storage = host_->permanentStorage()) {
+        settings_.retainedAtStart(*storage, protocol.GetInstanceName());
+    }
+    framing_.set(settings_.framing());
     bool started = false;
     {
         InterruptsBlocked forTheMainThread;  // the receive task starts here
@@ -129,12 +136,6 @@ bool PluginSession::configureAndStart(std::string& error) {
         error = "cannot start: " + why;
         return false;
     }
-    settings_ = SettingsModel();
-    settings_.configured(config_);
-    if (host::PermanentStorage* storage = host_->permanentStorage()) {
-        settings_.retainedAtStart(*storage, protocol.GetInstanceName());
-    }
-    framing_.set(settings_.framing());
     if (host::PermanentStorage* storage = host_->permanentStorage()) {
         const std::string warning =
             RetainedSettings(*storage, protocol.GetInstanceName()).queueSizeWarning();
