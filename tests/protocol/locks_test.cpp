@@ -32,29 +32,7 @@ int tokenNumber(const std::string& token) {
     return token.empty() ? -2 : digits ? std::stoi(token.substr(1)) : -1;
 }
 
-class Locks : public ProtocolFixture {
-protected:
-    /// Reads the head and acknowledges it until `last` is seen or `stop`;
-    /// the numbers seen, in order, and -1 for each torn read.
-    std::vector<int> consume(int last, const std::atomic<bool>& stop) {
-        std::vector<int> seen;
-        while (!stop && (seen.empty() || seen.back() != last)) {
-            const int number = tokenNumber(read("rx_token?string-16"));
-            if (number == -2) {
-                std::this_thread::yield();
-                continue;
-            }
-            seen.push_back(number);
-            write("token_ack?boolean", "1");
-        }
-        return seen;
-    }
-    void expectInOrder(const std::vector<int>& seen) {
-        for (std::size_t i = 0; i < seen.size(); ++i) {
-            ASSERT_TRUE(seen[i] >= 0 && (i == 0 || seen[i] > seen[i - 1])) << i << ": " << seen[i];
-        }
-    }
-};
+class Locks : public ProtocolFixture {};
 
 // A read or write of a token type holds the queue lock (made first) once,
 // for its whole duration, whatever the tag's size.
@@ -72,26 +50,6 @@ TEST_F(Locks, ATokenTypeAccessTakesTheQueueLockOnce) {
     const long before = queue.locks;
     write("token_ack?boolean", "1");
     EXPECT_EQ(queue.locks - before, 1);
-}
-
-TEST_F(Locks, WithRoomForAllEveryTokenArrivesOnceInOrder) {
-    ASSERT_TRUE(start("rx_prefix=02 rx_suffix=03 token_queue_size=10000"));
-    tag("0?rx_token?string-16"), tag("0?token_ack?boolean"), tag("0?tokens_available?unsignedInt");
-    std::atomic<bool> stop{false};
-    std::atomic<int> torn{0};
-    std::thread reader([&] {
-        while (!stop) {
-            torn += tokenNumber(read("rx_token?string-16")) == -1;
-            torn += std::atoi(read("tokens_available?unsignedInt").c_str()) < 0;
-        }
-    });
-    host.serial().feed(framedTokens(0, 2000));
-    const std::vector<int> seen = consume(1999, stop);
-    stop = true;
-    reader.join();
-    EXPECT_EQ(torn, 0);
-    EXPECT_EQ(seen.size(), 2000u);
-    expectInOrder(seen);
 }
 
 TEST_F(Locks, EverythingAtOnce) {
@@ -128,8 +86,15 @@ TEST_F(Locks, EverythingAtOnce) {
             command("get_token_length");
         }
     });
-    std::vector<int> seen;
-    std::thread consumer([&] { seen = consume(-3, stop); });  // until stopped
+    std::atomic<int> last{-1};
+    std::thread consumer([&] {  // each token read once and later than the one before
+        while (!stop) {
+            const int number = tokenNumber(read("rx_token?string-16"));
+            bad += number == -1 || (number >= 0 && number <= last);
+            last = number >= 0 ? number : last.load();
+            number == -2 ? std::this_thread::yield() : void(write("token_ack?boolean", "1"));
+        }
+    });
     host.serial().feed(framedTokens(0, 2000));
     EXPECT_TRUE(eventually([&] { return toggles >= 100; }));
     EXPECT_TRUE(host.serial().waitDrained(15000));
@@ -139,7 +104,6 @@ TEST_F(Locks, EverythingAtOnce) {
     }
     consumer.join();
     EXPECT_EQ(bad, 0);
-    expectInOrder(seen);
     ASSERT_EQ(write("SP_Done?boolean", "1"), "");  // still receiving afterwards
     host.serial().feed(framedTokens(2000, 1));
     ASSERT_TRUE(host.serial().waitDrained());
