@@ -25,7 +25,8 @@ constexpr int kInterruptCheckMs = 200;
 /// Which device, plug-in and state file this console works with.
 void banner(PluginSession& started, const SessionOptions& session, std::ostream& out) {
     const std::string line = started.serialSettings();
-    const std::string* port = ConfigText(session.config).find(kPortKey);
+    const ConfigText config(session.config);
+    const std::string* port = config.find(kPortKey);
     std::string device;
     std::string unused;
     session.ports.resolve(port ? *port : "", device, unused);
