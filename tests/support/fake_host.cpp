@@ -50,11 +50,6 @@ std::vector<std::string> FakeHost::calls() const {
     return calls_;
 }
 
-void FakeHost::clearCalls() {
-    std::lock_guard<std::mutex> lock(mutex_);
-    calls_.clear();
-}
-
 int FakeHost::outstanding() const {
     std::lock_guard<std::mutex> lock(mutex_);
     return outstanding_;

@@ -49,7 +49,6 @@ public:
     void provide(const std::string& name, void* service) { services_[name] = service; }
     /// "get NAME" and "release NAME" lines, in call order.
     std::vector<std::string> calls() const;
-    void clearCalls();
     /// Services handed out and not given back yet.
     int outstanding() const;
 
