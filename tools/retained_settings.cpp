@@ -4,30 +4,11 @@
 #include <vector>
 
 #include "protocol/settings.h"
+#include "tools/settings_model.h"
 
 namespace xtok::tools {
 
 namespace {
-
-/// Parity and mode by name, numbers as they are.
-std::string shown(const Setting& setting, int32_t value) {
-    if (setting.spelledAs == SpelledAs::ParityName && value >= 0 && value < kParityCount) {
-        return kParityNames[value];
-    }
-    if (setting.spelledAs == SpelledAs::ModeName && value >= 0 && value < kModeCount) {
-        return kModeNames[value];
-    }
-    return std::to_string(value);
-}
-
-int32_t codeOf(const char* const* names, int count, const std::string& name) {
-    for (int code = 0; code < count; ++code) {
-        if (name == names[code]) {
-            return code;
-        }
-    }
-    return -1;
-}
 
 /// The value of one of the rows kBaud to kMode.
 int32_t lineValue(const LineSettings& line, int id) {
@@ -52,7 +33,8 @@ std::string RetainedSettings::lineDifferences(const LineSettings& configured) {
         const int32_t value = lineValue(configured, id);
         if (retained != value) {
             differences += std::string(differences.empty() ? "" : ", ") + setting.key + " " +
-                           shown(setting, retained) + " (configured " + shown(setting, value) + ")";
+                           spelledNumber(setting, retained) + " (configured " +
+                           spelledNumber(setting, value) + ")";
         }
     }
     return differences;
@@ -110,11 +92,10 @@ bool parseSerialSettings(const std::string& text, std::string& port, LineSetting
     }
     port = text.substr(0, end);
     line.baud = std::atoi(fields[0].c_str());
-    line.parity = codeOf(kParityNames, kParityCount, fields[1]);
     line.bits = std::atoi(fields[2].c_str());
     line.stop = std::atoi(fields[3].c_str());
-    line.mode = codeOf(kModeNames, kModeCount, fields[4]);
-    return line.parity >= 0 && line.mode >= 0;
+    return configuredNumber(kSettings[kParity], fields[1], line.parity) &&
+           configuredNumber(kSettings[kMode], fields[4], line.mode);
 }
 
 }  // namespace xtok::tools

@@ -86,6 +86,16 @@ bool configuredNumber(const Setting& setting, const std::string& text, int32_t& 
     }
 }
 
+std::string spelledNumber(const Setting& setting, int32_t number) {
+    if (setting.spelledAs == SpelledAs::ParityName && number >= 0 && number < kParityCount) {
+        return kParityNames[number];
+    }
+    if (setting.spelledAs == SpelledAs::ModeName && number >= 0 && number < kModeCount) {
+        return kModeNames[number];
+    }
+    return std::to_string(number);
+}
+
 SettingsModel::SettingsModel() {
     for (const Setting& setting : kSettings) {
         activate(setting.id, defaultOf(setting), Source::Default);

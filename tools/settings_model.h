@@ -39,6 +39,9 @@ const Setting* findSettingByConfigKey(const std::string& key);
 /// A number, or a parity or mode code, as Configure reads it from `text`.
 /// False when the text spells none.
 bool configuredNumber(const Setting& setting, const std::string& text, int32_t& number);
+/// The other way round: a parity or mode code by its name, where it has
+/// one, any other number as it is.
+std::string spelledNumber(const Setting& setting, int32_t number);
 
 class SettingsModel {
 public:

@@ -9,16 +9,6 @@ namespace xtok::tools {
 
 namespace {
 
-std::string nameOf(const Setting& setting, int32_t code) {
-    if (setting.spelledAs == SpelledAs::ParityName && code >= 0 && code < kParityCount) {
-        return kParityNames[code];
-    }
-    if (setting.spelledAs == SpelledAs::ModeName && code >= 0 && code < kModeCount) {
-        return kModeNames[code];
-    }
-    return std::to_string(code);
-}
-
 std::string shown(const Setting& setting, const std::optional<StoredValue>& value) {
     if (!value) {
         return "-";
@@ -29,7 +19,7 @@ std::string shown(const Setting& setting, const std::optional<StoredValue>& valu
     if (const bool* flag = std::get_if<bool>(&*value)) {
         return *flag ? "true" : "false";
     }
-    return nameOf(setting, std::get<int32_t>(*value));
+    return spelledNumber(setting, std::get<int32_t>(*value));
 }
 
 std::string json(const std::optional<StoredValue>& value) {
