@@ -39,12 +39,12 @@ class Locks : public ProtocolFixture {};
 TEST_F(Locks, ATokenTypeAccessTakesTheQueueLockOnce) {
     ASSERT_TRUE(start("autoConnect=false"));
     FakeMutex& queue = *host.tasks().mutex(0);
-    for (const char* spec :
+    for (const char* what :
          {"tokens_available?unsignedInt", "rx_token_len?unsignedInt", "rx_token?string-64"}) {
-        tag("0?" + std::string(spec));
+        tag("0?" + std::string(what));
         const long before = queue.locks;
-        read(spec);
-        EXPECT_EQ(queue.locks - before, 1) << spec;
+        read(what);
+        EXPECT_EQ(queue.locks - before, 1) << what;
     }
     tag("0?token_ack?boolean");
     const long before = queue.locks;

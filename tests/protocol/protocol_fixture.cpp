@@ -28,21 +28,21 @@ bool eventually(const std::function<bool()>& condition) {
 
 namespace {
 
-/// The address of a "TYPE" or "TYPE?DATATYPE" spec: node 0, and the natural
+/// The address of a "TYPE" or "TYPE?DATATYPE": node 0, and the natural
 /// data type when none is named (texts 64 bytes long).
-std::string addressOf(IProtocol7& protocol, const std::string& spec) {
-    if (spec.find('?') != std::string::npos) {
-        return "0?" + spec;
+std::string addressOf(IProtocol7& protocol, const std::string& what) {
+    if (what.find('?') != std::string::npos) {
+        return "0?" + what;
     }
     static const std::map<int32_t, std::string> natural = {
         {kBoolean, "boolean"}, {kUnsignedByte, "unsignedByte"}, {kUnsignedInt, "unsignedInt"}};
     int32_t type = kByte;
     for (const MemoryType& memory :
          static_cast<Protocol_XTOK&>(protocol).models().front().memoryTypes) {
-        type = memory.name == spec ? memory.naturalType : type;
+        type = memory.name == what ? memory.naturalType : type;
     }
     auto it = natural.find(type);
-    return "0?" + spec + "?" + (it == natural.end() ? "string-64" : it->second);
+    return "0?" + what + "?" + (it == natural.end() ? "string-64" : it->second);
 }
 
 }  // namespace
@@ -81,8 +81,8 @@ ITag* ProtocolFixture::tag(const std::string& uri) {
     return made;
 }
 
-std::string ProtocolFixture::read(const std::string& spec) {
-    const std::string address = addressOf(*protocol, spec);
+std::string ProtocolFixture::read(const std::string& what) {
+    const std::string address = addressOf(*protocol, what);
     ITag* t = tag(address);
     if (!t) {
         return "!" + error();
@@ -108,8 +108,8 @@ std::string ProtocolFixture::read(const std::string& spec) {
     return bytesToHexText(value.data(), value.size());
 }
 
-std::string ProtocolFixture::write(const std::string& spec, const std::string& value) {
-    const std::string address = addressOf(*protocol, spec);
+std::string ProtocolFixture::write(const std::string& what, const std::string& value) {
+    const std::string address = addressOf(*protocol, what);
     ITag* t = tag(address);
     if (!t) {
         return "!" + error();

@@ -48,10 +48,10 @@ public:
     /// type, "TYPE?DATATYPE" any other. Texts read as text, unsignedInt as a
     /// signed number, bytes and booleans as numbers, anything else as hex;
     /// "!" and the last error when the read fails.
-    std::string read(const std::string& spec);
+    std::string read(const std::string& what);
     /// A typed write, values as `read` shows them;
     /// "" when it succeeds, else "!" and the last error.
-    std::string write(const std::string& spec, const std::string& value);
+    std::string write(const std::string& what, const std::string& value);
     /// The console's reply up to its first zero, "!" before it when it
     /// answered false.
     std::string command(const std::string& line);
@@ -74,7 +74,7 @@ public:
     ///   conf KEYS       configure only;  cfg TEXT: a whole configuration
     ///   go, stop        Start, Stop;  new: a fresh protocol, same instance
     ///   inst NAME       the instance name
-    ///   w SPEC VALUE    write a tag (see write)
+    ///   w WHAT VALUE    write a tag (see write)
     ///   play SCRIPT     bytes on the line (see play);  settle
     ///   fault F, heal F a fault of the host on or off: open, configure,
     ///                   write (the port), store, load (the storage), basic
@@ -82,7 +82,7 @@ public:
     ///   feed HEX, silence, error, hangup: the line's next reads; drain
     ///   store KEY TEXT  a retained value in the instance's section
     /// Steps that show:
-    ///   r SPEC          a tag's value (see read)
+    ///   r WHAT          a tag's value (see read)
     ///   cmd LINE        the console's reply (see command)
     ///   tokens          every queued token, taken as the panel takes them
     ///   line            the serial settings text
