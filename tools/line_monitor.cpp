@@ -11,7 +11,7 @@ LineMonitor::LineMonitor(FramingSource framing, QueueMirror& queue, bool json)
       framer_([this] { return framing_().rx; }) {}
 
 void LineMonitor::push(std::string line) {
-    if (!finished_) {
+    if (!finished_ && showing_) {
         lines_.push(std::move(line));
     }
 }
@@ -51,7 +51,7 @@ void LineMonitor::framed(const FramedToken& token) {
     push(tokenEventLine(token, arrival_, json_));
     const int32_t limit = framing_().queueLimit;
     long dropped = 0;
-    if (queue_.framed(token.bytes, limit, dropped)) {
+    if (queue_.framed(token.bytes, arrival_, limit, dropped)) {
         push(queueDropLine(dropped, limit, arrival_, json_));
     }
     const long limitTokens = tokenLimit_;

@@ -29,6 +29,8 @@ public:
     /// Follows the framing afresh, as from the start of a pass: switched on
     /// while a token is under way, the monitor may show only its end.
     void restart();
+    /// Whether it makes lines; it follows the line and the queue either way.
+    void show(bool on) { showing_ = on; }
     /// Makes no more lines after `count` tokens; 0 for no end.
     void stopAfter(long count) { tokenLimit_ = count; }
     /// True once the token limit is reached.
@@ -50,6 +52,7 @@ private:
     long tokens_ = 0;
     std::atomic<long> tokenLimit_{0};
     std::atomic<bool> finished_{false};
+    std::atomic<bool> showing_{false};
 };
 
 }  // namespace xtok::tools

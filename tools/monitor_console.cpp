@@ -30,17 +30,23 @@ void MonitorConsole::logTo(std::ofstream file, const std::string& path) {
     logPath_ = path;
 }
 
-void MonitorConsole::on() {
-    if (!on_) {
+void MonitorConsole::follow() {
+    if (!following_) {
         monitor_->restart();
         session_.follow(monitor_);
-        on_ = true;
+        following_ = true;
     }
+}
+
+void MonitorConsole::on() {
+    monitor_->show(true);
+    follow();
+    on_ = true;
 }
 
 void MonitorConsole::off() {
     if (on_) {
-        session_.unfollow();
+        monitor_->show(false);
         on_ = false;
         print();  // what it heard before, not after the next "on"
     }

@@ -26,6 +26,9 @@ public:
 
     /// Writes every line to `file` (opened by openLog on `path`) as well.
     void logTo(std::ofstream file, const std::string& path);
+    /// Follows the line from now on without showing it: the queue's tokens
+    /// are then known whole and with the time they arrived.
+    void follow();
     void on();
     void off();
     bool isOn() const { return on_; }
@@ -46,6 +49,7 @@ private:
     std::ofstream log_;
     std::string logPath_;
     bool on_ = false;
+    bool following_ = false;
 };
 
 }  // namespace xtok::tools

@@ -421,12 +421,16 @@ Intake PluginSession::takeToken(Token& token, std::string& error) {
     token.arrived = std::chrono::system_clock::now();
     token.text = stringValue(text.bytes);
     token.length = wordValue(length.bytes);
-    // A zero byte cut the text: the monitor's copy of the same token, if it
-    // saw one, holds the rest.
+    // The monitor's copy of the same token, when it followed the line, tells
+    // when its last byte arrived, and holds the rest of a raw token that a
+    // zero byte cut (rx_token reads up to the first zero byte).
     std::string whole;
-    if (token.length > token.text.size() && queue_.oldest(whole) && whole.size() == token.length &&
-        whole.compare(0, token.text.size() + 1, token.text + '\0') == 0) {
-        token.text = whole;
+    host::WallClock::time_point arrived;
+    if (queue_.oldest(whole, arrived)) {
+        const bool raw = whole.size() == token.length && whole.c_str() == token.text;
+        const bool hex = bytesToHexText(whole.data(), whole.size()) == token.text;
+        token.text = raw ? whole : token.text;
+        token.arrived = raw || hex ? arrived : token.arrived;
     }
     return write(kTokenAck, "1", error) ? Intake::Token : Intake::Failed;
 }

@@ -20,7 +20,8 @@ void QueueMirror::removeOldest() {
 }
 
 // As the plug-in pushes: a queue at or over its limit loses exactly one token.
-bool QueueMirror::framed(const std::string& bytes, int32_t limit, long& dropped) {
+bool QueueMirror::framed(const std::string& bytes, host::WallClock::time_point arrived,
+                         int32_t limit, long& dropped) {
     std::lock_guard<std::mutex> lock(mutex_);
     const bool full = count_ > 0 && count_ >= limit;
     if (full) {
@@ -28,7 +29,7 @@ bool QueueMirror::framed(const std::string& bytes, int32_t limit, long& dropped)
         dropped = ++dropped_;
     }
     ++count_;
-    newest_.push_back(bytes);
+    newest_.push_back({bytes, arrived});
     if (newest_.size() > kKept) {
         newest_.pop_front();
     }
@@ -50,12 +51,13 @@ void QueueMirror::restart(long count) {
     newest_.clear();
 }
 
-bool QueueMirror::oldest(std::string& bytes) const {
+bool QueueMirror::oldest(std::string& bytes, host::WallClock::time_point& arrived) const {
     std::lock_guard<std::mutex> lock(mutex_);
     if (count_ == 0 || newest_.size() != static_cast<std::size_t>(count_)) {
         return false;
     }
-    bytes = newest_.front();
+    bytes = newest_.front().bytes;
+    arrived = newest_.front().arrived;
     return true;
 }
 

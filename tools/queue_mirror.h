@@ -10,21 +10,25 @@
 #include <mutex>
 #include <string>
 
+#include "host/line_tap.h"
+
 namespace xtok::tools {
 
 class QueueMirror {
 public:
-    /// A token framed while `limit` is in force. True when the plug-in drops
-    /// its oldest token for it; `dropped` is then the count so far.
-    bool framed(const std::string& bytes, int32_t limit, long& dropped);
+    /// A token framed at `arrived` while `limit` is in force. True when the
+    /// plug-in drops its oldest token for it; `dropped` is then the count so far.
+    bool framed(const std::string& bytes, host::WallClock::time_point arrived, int32_t limit,
+                long& dropped);
     /// The host removed the oldest token (token_ack).
     void acknowledged();
     /// The queue was emptied (SP_Done, "token_ack all").
     void cleared();
     /// `count` tokens wait whose bytes the monitor did not see.
     void restart(long count);
-    /// The oldest token's received bytes, when the monitor saw them framed.
-    bool oldest(std::string& bytes) const;
+    /// The oldest token's received bytes and the time its last byte arrived,
+    /// when the monitor saw it framed.
+    bool oldest(std::string& bytes, host::WallClock::time_point& arrived) const;
 
 private:
     void removeOldest();
@@ -32,8 +36,12 @@ private:
     mutable std::mutex mutex_;
     long count_ = 0;
     long dropped_ = 0;
+    struct Seen {
+        std::string bytes;
+        host::WallClock::time_point arrived;
+    };
     // Copies of the newest tokens, at most kKept of them.
-    std::deque<std::string> newest_;
+    std::deque<Seen> newest_;
 };
 
 }  // namespace xtok::tools

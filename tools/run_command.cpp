@@ -47,24 +47,29 @@ void follow(MonitorConsole& monitor) {
     }
 }
 
-int console(const RunOptions& options, const SessionOptions& session,
-            const PluginDescription& description, std::ofstream log, std::ostream& out,
-            std::ostream& err) {
+int console(const RunOptions& options, SessionOptions session, const PluginDescription& description,
+            std::ofstream log, std::ostream& out, std::ostream& err) {
+    std::unique_ptr<MonitorConsole> monitor;
+    // Followed from before the start, though shown only when switched on: so
+    // the host knows every queued token whole and when it arrived.
+    session.beforeStart = [&](PluginSession& loaded) {
+        monitor = std::make_unique<MonitorConsole>(loaded, options.json, out, err);
+        monitor->logTo(std::move(log), options.logPath);
+        monitor->follow();
+    };
     std::string error;
     std::unique_ptr<PluginSession> started = PluginSession::start(session, error);
     if (!started) {
         reportFaults({error}, options.json, out, err);
         return 1;
     }
-    MonitorConsole monitor(*started, options.json, out, err);
-    monitor.logTo(std::move(log), options.logPath);
     bool typed = options.exec.empty() && isatty(STDIN_FILENO);
     std::unique_ptr<LineInput> input =
         options.exec.empty() ? LineInput::fromStdin("xtok> ") : LineInput::fromText(options.exec);
     if (typed && !options.json) {
         banner(*started, session, out);
     }
-    ConsoleSession console(*started, description, options.json, out, err, &monitor);
+    ConsoleSession console(*started, description, options.json, out, err, monitor.get());
     return console.run(*input) ? 0 : 1;
 }
 
@@ -113,7 +118,7 @@ int runSession(const RunOptions& options, bool monitoring, SessionOptions sessio
     session.resetRetained = options.resetRetained;
     session.reconnect = options.reconnect;
     return monitoring ? monitor(options, std::move(session), description, std::move(log), out, err)
-                      : console(options, session, description, std::move(log), out, err);
+                      : console(options, std::move(session), description, std::move(log), out, err);
 }
 
 }  // namespace xtok::tools

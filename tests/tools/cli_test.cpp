@@ -433,6 +433,13 @@ TEST_F(Session, MonitorShowsEachTokenWithWhatEndedIt) {
           "\"token\":\"C\\u0000\",\"length\":2,\"hex\":\"4300\"}"}) {
         EXPECT_NE(done.out.find(shown), std::string::npos) << shown << "\n" << done.out;
     }
+    // watch stamps a token with the time it arrived, as the monitor does.
+    auto timeOf = [&done](const std::string& part) {
+        const std::size_t line = done.out.rfind('\n', done.out.find(part)) + 1;
+        const std::size_t at = done.out.find("\"time\":\"", line) + 8;
+        return done.out.substr(at, done.out.find('"', at) - at);
+    };
+    EXPECT_EQ(timeOf("\"token\":\"A\\u0000B\""), timeOf("\"end\":\"suffix\",\"hex\":\"410042\""));
 }
 
 TEST_F(Session, MonitorEndsAtItsCountAndLogsWhatItShows) {
