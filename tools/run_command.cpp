@@ -47,20 +47,38 @@ void follow(MonitorConsole& monitor) {
     }
 }
 
-int console(const RunOptions& options, SessionOptions session, const PluginDescription& description,
-            std::ofstream log, std::ostream& out, std::ostream& err) {
-    std::unique_ptr<MonitorConsole> monitor;
-    // Followed from before the start, though shown only when switched on: so
-    // the host knows every queued token whole and when it arrived.
+/// Starts the session with the line monitor following the line from before
+/// the start, to see the port open: shown at once with `show`, else only once
+/// switched on, though the host then knows every queued token whole and when
+/// it arrived. Null, with the failure told, when it does not start.
+std::unique_ptr<PluginSession> startFollowed(const RunOptions& options, SessionOptions session,
+                                             std::ofstream log, bool show,
+                                             std::unique_ptr<MonitorConsole>& monitor,
+                                             std::ostream& out, std::ostream& err) {
     session.beforeStart = [&](PluginSession& loaded) {
         monitor = std::make_unique<MonitorConsole>(loaded, options.json, out, err);
         monitor->logTo(std::move(log), options.logPath);
-        monitor->follow();
+        monitor->stopAfter(options.count);
+        show ? monitor->on() : monitor->follow();
     };
     std::string error;
     std::unique_ptr<PluginSession> started = PluginSession::start(session, error);
     if (!started) {
+        if (monitor) {
+            monitor->print();  // what the line did before the start failed
+        }
         reportFaults({error}, options.json, out, err);
+    }
+    return started;
+}
+
+int console(const RunOptions& options, const SessionOptions& session,
+            const PluginDescription& description, std::ofstream log, std::ostream& out,
+            std::ostream& err) {
+    std::unique_ptr<MonitorConsole> monitor;
+    std::unique_ptr<PluginSession> started =
+        startFollowed(options, session, std::move(log), false, monitor, out, err);
+    if (!started) {
         return 1;
     }
     bool typed = options.exec.empty() && isatty(STDIN_FILENO);
@@ -73,23 +91,13 @@ int console(const RunOptions& options, SessionOptions session, const PluginDescr
     return console.run(*input) ? 0 : 1;
 }
 
-int monitor(const RunOptions& options, SessionOptions session, const PluginDescription& description,
-            std::ofstream log, std::ostream& out, std::ostream& err) {
+int monitor(const RunOptions& options, const SessionOptions& session,
+            const PluginDescription& description, std::ofstream log, std::ostream& out,
+            std::ostream& err) {
     std::unique_ptr<MonitorConsole> monitor;
-    // On before the start, to see the port open and its settings applied.
-    session.beforeStart = [&](PluginSession& loaded) {
-        monitor = std::make_unique<MonitorConsole>(loaded, options.json, out, err);
-        monitor->logTo(std::move(log), options.logPath);
-        monitor->stopAfter(options.count);
-        monitor->on();
-    };
-    std::string error;
-    std::unique_ptr<PluginSession> started = PluginSession::start(session, error);
+    std::unique_ptr<PluginSession> started =
+        startFollowed(options, session, std::move(log), true, monitor, out, err);
     if (!started) {
-        if (monitor) {
-            monitor->print();  // what the line did before the start failed
-        }
-        reportFaults({error}, options.json, out, err);
         return 1;
     }
     bool allGood = true;
