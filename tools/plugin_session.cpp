@@ -409,8 +409,7 @@ Intake PluginSession::takeToken(Token& token, std::string& error) {
     if (!read(kTokensAvailable, count, error)) {
         return Intake::Failed;
     }
-    if (count.bytes.size() < 4 ||
-        (count.bytes[0] | count.bytes[1] | count.bytes[2] | count.bytes[3]) == 0) {
+    if (wordValue(count.bytes) == 0) {
         return Intake::None;
     }
     TagValue length;

@@ -28,8 +28,8 @@ int millisecondsUntil(std::chrono::steady_clock::time_point when,
 
 }  // namespace
 
-SimulatedDevice::SimulatedDevice(int fd, DeviceOptions options, Listener listener)
-    : fd_(fd), options_(std::move(options)), listener_(std::move(listener)) {
+SimulatedDevice::SimulatedDevice(int fd, DeviceOptions options)
+    : fd_(fd), options_(std::move(options)) {
     int pipeFds[2] = {-1, -1};
     if (pipe2(pipeFds, O_NONBLOCK | O_CLOEXEC) == 0) {
         wakeRead_ = pipeFds[0];
@@ -56,11 +56,11 @@ SimulatedDevice::~SimulatedDevice() {
 }
 
 void SimulatedDevice::send(const std::string& token) {
-    queue({options_.sendPrefix + token + options_.sendSuffix, token, false});
+    queue({options_.sendPrefix + token + options_.sendSuffix, false});
 }
 
 void SimulatedDevice::sendRaw(const std::string& bytes) {
-    queue({bytes, "", false});
+    queue({bytes, false});
 }
 
 std::vector<std::string> SimulatedDevice::tokens() const {
@@ -95,12 +95,6 @@ void SimulatedDevice::wake() {
     char one = 1;
     // A full pipe already holds a wake-up; nothing is lost.
     [[maybe_unused]] ssize_t ignored = ::write(wakeWrite_, &one, 1);
-}
-
-void SimulatedDevice::tell(DeviceEvent::Kind kind, const std::string& token) {
-    if (listener_) {
-        listener_(DeviceEvent{kind, token});
-    }
 }
 
 void SimulatedDevice::run() {
@@ -202,7 +196,6 @@ void SimulatedDevice::takeBytes(const std::string& chunk) {
             tokens_.push_back(token);
         }
         changed_.notify_all();
-        tell(DeviceEvent::Kind::Received, token);
         answer(token);
         if (suffix.empty()) {
             return;
@@ -223,23 +216,19 @@ void SimulatedDevice::answer(const std::string& token) {
     }
     if (token == "!silent") {
         silent_ = true;
-        tell(DeviceEvent::Kind::Fault, "silent");
     } else if (token == "!garbage") {
         std::string noise;
         std::copy_if(kNoise.begin(), kNoise.end(), std::back_inserter(noise), [&](char c) {
             return prefix.find(c) == std::string::npos && suffix.find(c) == std::string::npos;
         });
-        queue({noise, "", true});
-        tell(DeviceEvent::Kind::Fault, "garbage");
+        queue({noise, true});
     } else if (token == "!unterminated") {
-        queue({prefix + "UNTERMINATED", "", true});
-        tell(DeviceEvent::Kind::Fault, "unterminated");
+        queue({prefix + "UNTERMINATED", true});
     } else if (token == "!overlong") {
-        queue({prefix + std::string(1200, 'X') + suffix, "", true});
-        tell(DeviceEvent::Kind::Fault, "overlong");
+        queue({prefix + std::string(1200, 'X') + suffix, true});
     } else {
         std::string reply = "ACK " + token;
-        queue({prefix + reply + suffix, reply, false});
+        queue({prefix + reply + suffix, false});
     }
 }
 
@@ -248,7 +237,7 @@ void SimulatedDevice::sendCodeIfDue(Clock::time_point now) {
         return;
     }
     const std::string& code = options_.codes[nextCode_++ % options_.codes.size()];
-    queue({options_.sendPrefix + code + options_.sendSuffix, code, false});
+    queue({options_.sendPrefix + code + options_.sendSuffix, false});
     codeDue_ = std::max(codeDue_ + options_.interval, now);
 }
 
@@ -270,9 +259,6 @@ void SimulatedDevice::flush(Clock::time_point now) {
             writing_ = next.bytes;
             if (next.faulty) {
                 quietUntil_ = now + options_.settle;
-            }
-            if (!next.token.empty()) {
-                tell(DeviceEvent::Kind::Sent, next.token);
             }
         }
         ssize_t put = ::write(fd_, writing_.data(), writing_.size());

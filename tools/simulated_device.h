@@ -17,7 +17,6 @@
 #include <condition_variable>
 #include <cstddef>
 #include <deque>
-#include <functional>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -37,19 +36,10 @@ struct DeviceOptions {
     bool answer = true;
 };
 
-struct DeviceEvent {
-    enum class Kind { Sent, Received, Fault };
-    Kind kind;
-    std::string token;  // the token sent or received; the fault's name
-};
-
 class SimulatedDevice {
 public:
-    using Listener = std::function<void(const DeviceEvent&)>;
-
     /// Runs on `fd` (a non-blocking device end, not owned) until destroyed.
-    /// `listener` is called on the device's own thread.
-    SimulatedDevice(int fd, DeviceOptions options, Listener listener = {});
+    SimulatedDevice(int fd, DeviceOptions options);
     ~SimulatedDevice();
     SimulatedDevice(const SimulatedDevice&) = delete;
     SimulatedDevice& operator=(const SimulatedDevice&) = delete;
@@ -71,7 +61,6 @@ private:
     using Clock = std::chrono::steady_clock;
     struct Outgoing {
         std::string bytes;
-        std::string token;  // for the listener; empty for raw bytes
         bool faulty;
     };
 
@@ -84,11 +73,9 @@ private:
     void sendCodeIfDue(Clock::time_point now);
     void flush(Clock::time_point now);
     void wake();
-    void tell(DeviceEvent::Kind kind, const std::string& token);
 
     int fd_;
     DeviceOptions options_;
-    Listener listener_;
     int wakeRead_ = -1;
     int wakeWrite_ = -1;
 

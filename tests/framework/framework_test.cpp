@@ -53,9 +53,9 @@ TEST(DataTypes, ParseTheTypeOfATagAddressThenConvertInPlaceOrRefuse) {
                   parsed("boolean-16") + parsed("byte-12abc") + parsed("byte--5"),
               "6/0/2 15/3/8/swap2/neg/ 2/0/1/ 13/1/16 14/2/12 14/2/0 ");
     EXPECT_EQ(parsed("string-1000000") + parsed("short-134217727") + parsed("short-134217728") +
-                  parsed("byte)(swap2") + parsed("Byte") + parsed("object-2") +
-                  parsed("byte-99999999999999999999"),
-              "10/2/1000000 15/3/268435454 refused refused refused refused refused ");
+                  parsed("byte)(swap2") + parsed("byte(swap2") + parsed("Byte") +
+                  parsed("object-2") + parsed("byte-99999999999999999999"),
+              "10/2/1000000 15/3/268435454 refused refused refused refused refused refused ");
     for (int32_t code = 1; code <= 26; ++code) {
         DataType type;
         const std::string name = DataTypeName(code, 24);

@@ -41,14 +41,16 @@ const Scenario kMemoryTypes[] = {
     {"SettingsAreValidatedAndStagedWithoutApplying",
      "start; w SP_Baud 19200; r SP_Baud; w SP_Baud 115200; w SP_Baud 14400; w SP_Par 4; "
      "w tokens_available 1; w SP_Par 5; w SP_Bits 7; w SP_Bits 9; w SP_Stop 2; w SP_Stop 0; "
-     "w SP_Mode 2; w SP_Mode 3; w SP_RxPrefix 0d0A; r SP_RxPrefix; w SP_RxPrefix none; "
+     "w SP_Mode 2; w SP_Mode 3; w SP_RxPrefix 0d0A; r SP_RxPrefix; w SP_RxPrefix?string-3 02; "
+     "r SP_RxPrefix; w SP_RxPrefix none; "
      "r SP_RxPrefix; w SP_RxPrefix ; r SP_RxPrefix; w SP_RxPrefix 0D0; w SP_RxSuffix 0G; "
      "w SP_TxPrefix NONE; w SP_TxSuffix 0 ; w SP_Gap 1234; w SP_HexTokens 1; "
      "w SP_TokenQueueSize 50000; r SP_Baud; r SP_Par; r SP_Bits; r SP_Stop; r SP_Mode; "
      "r SP_Gap; r SP_HexTokens; r SP_TokenQueueSize; cfgd; line; stored baud",
      "19200 | !illegal baudrate intValue | !writing to read_only type | !writing to read_only type "
      "| !writing to read_only type | !writing to read_only type | !writing to read_only type | "
-     "0d0A | none | '' | !Rx prefix value is not hex format | !Rx suffix value is not hex format | "
+     "0d0A | 02 | none | '' | !Rx prefix value is not hex format | !Rx suffix value is not hex "
+     "format | "
      "!Tx prefix value is not hex format | !Tx suffix value is not hex format | 115200 | 4 | 7 | 2 "
      "| 2 | 1234 | 1 | 50000 | 9600/1/8/1/0 | com1,9600,even,8,1,RS-232 | -"},
     // SP_Done applies every staged value, retains it under the instance name

@@ -147,16 +147,18 @@ const Script kScripts[] = {
     {"SettingsTellWhereEachActiveValueCameFrom",
      {"--json"},
      "tag write 0?SP_Gap?unsignedInt 70; tag write 0?SP_Done?boolean 1 || set_rxPrefix 05; "
+     "set_rxGap 2a; "
      "tag write 0?SP_TokenQueueSize?unsignedInt 50; settings; tag write 0?SP_Done?boolean 1; "
      "settings; connect OFF; connect ON; tag write 0?tx_token?string-8 HI; "
      "watch --count 1 --timeout 10",
      {"\"SP_Baud\":{\"key\":\"baudrate\",\"active\":9600,\"source\":\"configuration\"",
       "\"SP_RxPrefix\":{\"key\":\"rx_prefix\",\"active\":\"05\",\"source\":\"console\"",
-      "\"SP_Gap\":{\"key\":\"gap\",\"active\":70,\"source\":\"retained file\","
+      "\"SP_Gap\":{\"key\":\"gap\",\"active\":2,\"source\":\"console\","
       "\"staged\":null,\"retained\":70}",
       "\"SP_TokenQueueSize\":{\"key\":\"token_queue_size\",\"active\":100,"
       "\"source\":\"default\",\"staged\":50,\"retained\":null}",
       "\"SP_RxPrefix\":{\"key\":\"rx_prefix\",\"active\":\"02\",\"source\":\"configuration\"",
+      "\"SP_Gap\":{\"key\":\"gap\",\"active\":70,\"source\":\"retained file\"",
       "\"SP_TokenQueueSize\":{\"key\":\"token_queue_size\",\"active\":50,"
       "\"source\":\"SP_ write\",\"staged\":50,\"retained\":50}",
       "\"token\":\"ACK HI\""},
@@ -255,12 +257,14 @@ TEST_F(Session, ALockedStateFileFailsOnlyWhatItMustKeep) {
     ASSERT_TRUE(holder && holder->begin(error) && holder->WriteInt("XTOK", "gap", 1)) << error;
     Finished done = runTool(run({"--exec",
                                  "get_stat; tag write 0?SP_Gap?unsignedInt 5; "
-                                 "tag write 0?SP_Done?boolean 1; tag read 0?SP_Gap?unsignedInt"}));
+                                 "tag write 0?SP_Done?boolean 1; tag read 0?SP_Gap?unsignedInt; "
+                                 "reset-retained"}));
     EXPECT_EQ(done.status, 1);
     EXPECT_EQ(done.out, "Connected\nok\n5\n");
     EXPECT_EQ(done.err,
               "error: 0?SP_Done?boolean written, but its settings are not retained: database "
-              "is locked\n");
+              "is locked\nerror: cannot clear the settings retained in " +
+                  dir_.file("retained.sqlite3") + " for instance XTOK: database is locked\n");
 }
 
 // Line settings retained in the state file that the port refuses do not
@@ -314,6 +318,20 @@ TEST_F(Session, CtrlCEndsAWatchAndTheScriptGoesOn) {
     Finished done = session.finish(10s);
     EXPECT_EQ(done.status, 0) << done.err;
     EXPECT_EQ(linesOf(done.out).back(), "Connected") << done.out;
+}
+
+// 256 tokens already waiting when the run begins: a count whose low byte is
+// 0 still counts, and watch takes them all.
+TEST_F(Session, WatchTakesAQueueOf256Tokens) {
+    std::string frames;
+    for (int i = 0; i < 256; ++i) {
+        frames += "\2T\3";
+    }
+    ASSERT_EQ(write(line_->master(), frames.data(), frames.size()), ssize_t(frames.size()));
+    Finished done =
+        runTool(run({"--queue-size", "300", "--exec", "watch --count 256 --timeout 10"}));
+    EXPECT_EQ(done.status, 0) << done.err;
+    EXPECT_EQ(countOf(done.out, "\"T\""), 256);
 }
 
 // Without --config the editor's defaults make the line.
@@ -574,7 +592,7 @@ TEST(Cli, TheCompletionScriptOffersTheCommandsAndTheirOptions) {
 // (0 for a value that only earns a warning).
 // In the arguments, {line} is a free pseudo-terminal, {busy} one that another
 // program holds, {locked} a file the user may not open, {dir} a scratch
-// directory (with big.cfg, a file past 1 MiB; zero.cfg, one with a zero
+// directory (with big.cfg, a file past 1 MiB; mib.cfg, one of 1 MiB; zero.cfg, one with a zero
 // byte; fifo, a FIFO), {text} a file that is no plug-in. The state file
 // retains parity even.
 struct BadInput {
@@ -626,6 +644,7 @@ const BadInput kBadInputs[] = {
      "run|--config|{np} port={line}|--exec|tag write 0?SP_TokenQueueSize?unsignedInt 10001",
      "SP_TokenQueueSize 10001 lies outside", 0},
     {"configuration file too large", "run|--config|@{dir}/big.cfg", "at most 1 MiB", 2},
+    {"configuration file of 1 MiB, no more", "run|--config|@{dir}/mib.cfg", "unknown format", 2},
     {"configuration file with a zero byte", "run|--config|@{dir}/zero.cfg", "zero byte", 2},
     {"configuration FIFO", "run|--config|@{dir}/fifo", "is a FIFO", 2},
     {"configuration directory", "run|--config|@{dir}", "is a directory", 2},
@@ -649,6 +668,7 @@ protected:
         std::ofstream(dir_.file("notes.txt")) << "not a plug-in\n";
         std::ofstream(dir_.file("locked")) << "";
         std::ofstream(dir_.file("big.cfg")) << std::string((1 << 20) + 1, ' ');
+        std::ofstream(dir_.file("mib.cfg")) << std::string(1 << 20, ' ');
         std::ofstream(dir_.file("zero.cfg")) << kNoPort + std::string(1, '\0') + " port=com1";
         ASSERT_EQ(mkfifo(dir_.file("fifo").c_str(), 0600), 0);
         auto storage = host::PermanentStorage::open(dir_.file("retained.sqlite3"), error);

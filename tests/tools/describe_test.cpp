@@ -89,7 +89,8 @@ TEST(Describe, MisshapenXmlIsRefusedNotReadPast) {
     DescriptionBlock found;
     std::ostringstream out;
     std::string error;
-    for (const char* xml : {"<protocol_cfg><memtype display=\"A>a", "<protocol_cfg", "<>"}) {
+    for (const char* xml : {"<protocol_cfg><memtype display=\"A>a", "<protocol_cfg", "<>",
+                            "<protocol_cfg><memtype display>a</memtype></protocol_cfg>"}) {
         EXPECT_FALSE(summarizeDescription(found, xml, out, error)) << xml;
         EXPECT_NE(error.find("no XML document"), std::string::npos) << error;
     }

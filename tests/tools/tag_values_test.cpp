@@ -5,6 +5,8 @@
 #include <gtest/gtest.h>
 
 #include "tools/byte_text.h"
+#include "tools/monitor_lines.h"
+#include "tools/token_view.h"
 
 namespace xtok::tools {
 namespace {
@@ -135,6 +137,17 @@ TEST(ByteText, EveryByteSurvivesEscapingAndBack) {
                                    "A\xFF",
                                    3)),
               "02 41 FF");
+}
+
+// Times to the millisecond, and the monitor's word when the console fell
+// behind, for people and as JSON.
+TEST(MonitorLines, TimesAndDroppedLines) {
+    const auto at = std::chrono::system_clock::time_point(std::chrono::milliseconds(1999));
+    EXPECT_EQ(isoTime(at), "1970-01-01T00:00:01.999Z");
+    EXPECT_EQ(clockText(at).substr(8), ".999");
+    EXPECT_NE(linesDroppedLine(3, false).find(" 3 lines dropped: the console fell behind"),
+              std::string::npos);
+    EXPECT_NE(linesDroppedLine(3, true).find("\"linesDropped\":3}"), std::string::npos);
 }
 
 }  // namespace
