@@ -114,10 +114,12 @@ TEST_F(MemoryTypes, RetainedValuesWinOverTheConfigurationAtStart) {
     EXPECT_EQ(host.storage().writes(), 0);
 }
 
-TEST_F(MemoryTypes, AReadWithoutABufferFails) {
+TEST_F(MemoryTypes, AReadOrWriteWithoutABufferFails) {
     ASSERT_TRUE(start());
     EXPECT_FALSE(protocol->ReadTagRaw(tag("0?rx_token_len?unsignedInt"), nullptr, 4));
     EXPECT_EQ(error(), "illegal memtype to read");
+    EXPECT_FALSE(protocol->WriteTag(tag("0?SP_Gap?unsignedInt"), nullptr));
+    EXPECT_EQ(error(), "illegal memtype to write");
 }
 
 }  // namespace

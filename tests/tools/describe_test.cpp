@@ -49,6 +49,8 @@ TEST(Describe, RefusesDamagedBlocksWithAReason) {
         {"whole", block(good, good.size(), end), ""},
         {"no marker", "just some library bytes", "no <<ICOM_XML_START>> marker"},
         {"header never ends", "<<ICOM_XML_START>>" + std::string(5000, 'x'), "header line"},
+        {"header ends too far", "<<ICOM_XML_START>>" + std::string(5000, 'x') + '\0',
+         "header line"},
         {"no size line", std::string("<<ICOM_XML_START>>N=1\0oops\0", 27), "compressedXML=N"},
         {"size past the file", block(good, 999999, end), "no <<ICOM_XML_END>> marker"},
         {"size not a number", unnumbered, "compressedXML=N"},
