@@ -88,6 +88,12 @@ const Scenario kMemoryTypes[] = {
      "w connect 1; opens",
      "1 | 1/0 com1 | 020103 | 1/1 com1 | !Serial port not active for sending | OK | !token to send "
      "must be in hex format | 2/1 com1"},
+    // Sixteen tokens taken, then one more of the same length in the place of
+    // the first.
+    {"ASecondRoundOfTheQueueHoldsTheNewTokens",
+     "start rx_suffix=03; play 41 03 42 03 43 03 44 03 45 03 46 03 47 03 48 03 49 03 4A 03 4B 03 "
+     "4C 03 4D 03 4E 03 4F 03 50 03; tokens; play 5A 03; tokens",
+     "A,B,C,D,E,F,G,H,I,J,K,L,M,N,O,P | Z"},
     // SP_Done empties the queue too, and the queue outlives a restart.
     {"AFullQueueDropsItsOldestTokenOnePerPush",
      "start token_queue_size=3 rx_suffix=03; play 41 03 42 03 43 03 44 03; tokens; "
