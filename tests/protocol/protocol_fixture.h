@@ -8,6 +8,7 @@
 #include <functional>
 #include <map>
 #include <memory>
+#include <ostream>
 #include <string>
 #include <thread>
 #include <vector>
@@ -116,6 +117,11 @@ struct Scenario {
     const char* script;
     const char* shows;
 };
+
+// ctest lists a row by its name rather than its bytes.
+inline void PrintTo(const Scenario& row, std::ostream* out) {
+    *out << row.name;
+}
 
 class Scenarios : public ProtocolFixture, public ::testing::WithParamInterface<Scenario> {};
 

@@ -29,6 +29,10 @@ struct FramingCase {
     std::vector<std::string> tokens;  ///< as hex text, so that every byte compares
 };
 
+void PrintTo(const FramingCase& row, std::ostream* out) {
+    *out << row.name;
+}
+
 const std::string k999 = times(999, "41 "), k1000 = times(1000, "41 ");
 const char* const kP = "rx_prefix=02";
 const char* const kS = "rx_suffix=03";

@@ -94,6 +94,10 @@ struct Script {
     int status;
 };
 
+void PrintTo(const Script& row, std::ostream* out) {
+    *out << row.name;
+}
+
 const Script kScripts[] = {
     {"ReadsWritesAndWatches",
      {},
