@@ -8,6 +8,7 @@
 
 #include <chrono>
 #include <fstream>
+#include <ostream>
 #include <string>
 #include <thread>
 
@@ -119,6 +120,11 @@ struct Line {
     speed_t speed;
     tcflag_t flags;  // of CSIZE, PARENB, PARODD, CMSPAR, CSTOPB
 };
+
+// ctest names a row by its line settings rather than its bytes.
+void PrintTo(const Line& line, std::ostream* out) {
+    *out << line.baud << "/" << line.parity << "/" << line.bits << "/" << line.stop;
+}
 
 class Lines : public Pty, public ::testing::WithParamInterface<Line> {};
 
