@@ -53,6 +53,7 @@ TEST_F(Storage, KeepsEachTypeAcrossReopening) {
     EXPECT_STREQ(storage->ReadText("XTOK", "empty"), "");
     EXPECT_EQ(storage->ReadText("XTOK", "long"), longText);
     EXPECT_STREQ(storage->ReadText("other", "prefix"), "ÄÖ\xff");
+    EXPECT_STREQ(storage->ReadText("other", "none"), "");  // not the text read before
     for (const char* key : {"baud", "min", "on", "off", "prefix", "empty", "long"}) {
         EXPECT_TRUE(storage->IsStored("XTOK", key)) << key;
     }

@@ -44,9 +44,6 @@ public:
 
     /// Makes GetService answer null for this name.
     void refuse(const std::string& name) { refused_.insert(name); }
-    /// Replaces the object handed out for a name (the host keeps ownership
-    /// of its own; the caller keeps ownership of `service`).
-    void provide(const std::string& name, void* service) { services_[name] = service; }
     /// "get NAME" and "release NAME" lines, in call order.
     std::vector<std::string> calls() const;
     /// Services handed out and not given back yet.

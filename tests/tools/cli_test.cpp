@@ -521,6 +521,13 @@ TEST(Cli, DescribeShowsTheNineteenMemoryTypesAndTheWholeXml) {
     ASSERT_NE(heading, lines.end()) << summary.out;
     EXPECT_EQ(lines.end() - heading - 1, 19);
     EXPECT_EQ(lines[0], "Name       XTOK");
+    for (const char* line :
+         {"  port              list of string    default com1    mandatory  16 choices: com1, "
+          "com2, com3, com4 ... com16",
+          "  parity            list of string    default even    mandatory  none, even, odd",
+          "  rx_prefix         string            -               optional"}) {
+        EXPECT_NE(std::find(lines.begin(), lines.end(), line), lines.end()) << line;
+    }
 
     Finished xml = runTool({kHost, "describe", "--xml", kPlugin});
     EXPECT_EQ(xml.status, 0) << xml.err;

@@ -73,18 +73,20 @@ TEST(Describe, RefusesDamagedBlocksWithAReason) {
     }
 }
 
-TEST(Describe, ACommentIsSkippedWholeEvenWithTagsInIt) {
+TEST(Describe, ACommentIsSkippedWholeAndEntitiesAreRead) {
     DescriptionBlock found;
     std::ostringstream out;
     std::string error;
     EXPECT_TRUE(summarizeDescription(
         found,
         "<protocol_cfg><!-- a > <memtypes><memtype>hidden</memtype></memtypes> -->"
-        "<memtypes><memtype>shown</memtype></memtypes></protocol_cfg>",
+        "<memtypes><memtype display=\"&lt;A&gt; &amp;B\">shown</memtype></memtypes>"
+        "</protocol_cfg>",
         out, error))
         << error;
     EXPECT_EQ(out.str().find("hidden"), std::string::npos) << out.str();
     EXPECT_NE(out.str().find("shown"), std::string::npos) << out.str();
+    EXPECT_NE(out.str().find("<A> &B\n"), std::string::npos) << out.str();
 }
 
 TEST(Describe, MisshapenXmlIsRefusedNotReadPast) {
