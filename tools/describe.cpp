@@ -147,7 +147,8 @@ bool inflateDescription(const std::string& compressed, std::string& xml, std::st
     }
     std::string why = stream.msg ? stream.msg : "";
     inflateEnd(&stream);
-    if (result == Z_STREAM_END) {
+    // The last chunk may end the stream past the limit.
+    if (result == Z_STREAM_END && xml.size() <= kMaxXml) {
         return true;
     }
     error = xml.size() > kMaxXml ? "the description inflates to more than 16 MiB"

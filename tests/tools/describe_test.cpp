@@ -52,7 +52,7 @@ TEST(Describe, RefusesDamagedBlocksWithAReason) {
         {"header ends too far", "<<ICOM_XML_START>>" + std::string(5000, 'x') + '\0',
          "header line"},
         {"no size line", std::string("<<ICOM_XML_START>>N=1\0oops\0", 27), "compressedXML=N"},
-        {"size past the file", block(good, 999999, end), "no <<ICOM_XML_END>> marker"},
+        {"size past the file", block(good, 999999999, end), "no <<ICOM_XML_END>> marker"},
         {"size not a number", unnumbered, "compressedXML=N"},
         {"wrong end marker", block(good, good.size(), "<<ICOM_XML_STOP>>"), "END>> marker"},
         {"size too short", block(good, good.size() - 1, end), "END>> marker"},
@@ -70,6 +70,16 @@ TEST(Describe, RefusesDamagedBlocksWithAReason) {
         if (ok) {
             EXPECT_EQ(inflated, xml) << c.what;
         }
+    }
+}
+
+// A small block can inflate to anything: 16 MiB are read, a byte more is not.
+TEST(Describe, ADescriptionInflatesTo16MiBAtMost) {
+    const std::size_t most = 16u << 20;
+    for (std::size_t size : {most, most + 1}) {
+        std::string xml, error;
+        EXPECT_EQ(inflateDescription(deflated(std::string(size, ' ')), xml, error), size == most);
+        EXPECT_EQ(error, size == most ? "" : "the description inflates to more than 16 MiB");
     }
 }
 
