@@ -127,12 +127,14 @@ TEST_P(Framing, QueuesTheTokens) {
 INSTANTIATE_TEST_SUITE_P(Rows, Framing, ::testing::ValuesIn(kFraming),
                          [](const auto& info) { return std::string(info.param.name); });
 
-// The gap is the read time-out; none, 0 or less mean half a second.
+// The gap is the read time-out; none, 0 or less mean half a second. A longer
+// gap is read in half-second slices, and a byte in any slice is kept.
 const Scenario kGaps[] = {{"TheGapIsTheReadTimeOut",
                            "start gap=20; play 41 42 | 43; gap; new; start gap=0; play 41; gap; "
                            "new; start; play 41; gap; new; start gap=1; play 41; gap; new; "
-                           "start gap=-5; play 41; gap",
-                           "20 | 500 | 500 | 1 | 500"}};
+                           "start gap=-5; play 41; gap; new; start gap=2000 rx_suffix=03; "
+                           "play 41 03 | | | | 42 03; gap; tokens",
+                           "20 | 500 | 500 | 1 | 500 | 500 | A,B"}};
 
 INSTANTIATE_TEST_SUITE_P(Receive, Scenarios, ::testing::ValuesIn(kGaps), scenarioName);
 
