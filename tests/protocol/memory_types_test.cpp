@@ -67,8 +67,9 @@ const Scenario kMemoryTypes[] = {
      "05414206 | 19200/2/7/2/1 | 2 | 44"},
     {"DoneReconfiguresOnlyOnAChangeAndAClosedPortAtItsNextOpen",
      "start autoConnect=false; w SP_Baud 9600; w SP_Done 1; w SP_Baud 57600; w SP_Done 1; "
-     "cfgd; w connect 1; cfgd; w SP_Baud 57600; w SP_Done 1; cfgd",
-     "- | 57600/1/8/1/0 | -"},
+     "cfgd; w connect 1; cfgd; w SP_Baud 57600; w SP_Done 1; cfgd; w SP_Gap 30; w SP_Done 1; "
+     "cfgd; w SP_Baud 19200; w SP_Done 1; cfgd",
+     "- | 57600/1/8/1/0 | - | - | 19200/1/8/1/0"},
     {"TransmitFramesTheToken",
      "start tx_prefix=02 tx_suffix=03 hex_tokens=true; w tx_token 4a4B; w tx_token 41G2; "
      "w tx_token 414; w tx_token none; sent; "

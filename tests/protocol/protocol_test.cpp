@@ -96,8 +96,9 @@ TEST_F(Protocol, ConfigurationErrorsSayWhy) {
     EXPECT_EQ(run("line").substr(0, 10), "com7,4800,");  // what was read before stays
     EXPECT_TRUE(
         configure("token_queue_size=10000 rx_prefix=0d0A tx_prefix=none gap=0x14 "
-                  "Node1::model=1"));
+                  "Node3::model=7"));
     EXPECT_TRUE(configure("token_queue_size=1"));  // a second Configure starts afresh
+    EXPECT_NE(protocol->CreateTag("3?connect?boolean"), nullptr) << error();
 }
 
 struct UriCase {
