@@ -158,6 +158,7 @@ TEST(Clock, StampsAndBrokenDownTimesBothWays) {
     int64_t stamp = -1;  // each field out of range
     EXPECT_FALSE(
         SystemTimeToStamp({2001, 2, 0, 29}, stamp) || SystemTimeToStamp({2000, 13, 0, 1}, stamp) ||
+        SystemTimeToStamp({2000, 12, 0, 32}, stamp) ||
         SystemTimeToStamp({1600, 12, 0, 31}, stamp) || SystemTimeToStamp({30828, 1, 0, 1}, stamp) ||
         SystemTimeToStamp({2000, 1, 0, 1, 24}, stamp) ||
         SystemTimeToStamp({2000, 1, 0, 1, 0, 0, 0, 1000}, stamp));
@@ -347,9 +348,9 @@ TEST_F(ProtocolBaseTest, ReadsConvertStampAfterASuccessAndRewriteWholeArrays) {
     EXPECT_EQ(error(), "-1 accessing array item out of range");
     // An item is written by rewriting the whole array.
     EXPECT_TRUE(protocol.WriteArrayItem(array, 3, &item) &&
-                protocol.ReadArrayItem(array, 1, &item));
+                protocol.ReadArrayItem(array, 0, &item));
     EXPECT_EQ(std::string(protocol.memory + 4, 8) + std::to_string(item),
-              "\x78\x56\x34\x12\0\0\x02\x01"s + std::to_string(0x1234));
+              "\x78\x56\x34\x12\0\0\x02\x01"s + std::to_string(0x5678));
     protocol.failReads = true;
     stamps[0] = stamps[1] = -5;
     EXPECT_FALSE(protocol.ReadTagStamped(tag("0?int"), &value, &stamps[0]) ||

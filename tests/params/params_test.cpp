@@ -42,8 +42,9 @@ std::string lookup(const char* text, const char* name, int32_t node, int flags) 
 
 TEST(ParamParser, FindsEntriesWhereAnEntryCanStartByThePrefixRules) {
     EXPECT_EQ(lookup("CfgVer=1a=1", "a", -1, 0) +
-                  lookup("CfgVer=1 xport=1 Node3::port=2 port=4 port=5", "port", -1, 0),
-              "0 1,0 4,");
+                  lookup("CfgVer=1 xport=1 Node3::port=2 port=4 port=5", "port", -1, 0) +
+                  lookup("CfgVer=1\r\nport=com1\r\n", "port", -1, 0),
+              "0 1,0 4,0 com1,");  // a file written on Windows ends its lines in CR LF
     // Bytes above 0x7F are not blanks.
     EXPECT_EQ(lookup("CfgVer=1 \xA0p=1 p=x\xA0y z", "p", -1, 0), "0 x\xA0y,");
     // A name holding "=" or a blank matches across what the others see as entries.
