@@ -90,22 +90,24 @@ TEST_F(Storage, ReadTextToNeedsRoomForTheZero) {
     EXPECT_FALSE(extended->ReadTextTo("XTOK", "suffix", nullptr, 8));
 }
 
-// The state directory the user's environment names, else the home's; an
-// empty name counts as none.
+// The state directory the user's environment names, else the home's, else
+// none (a service may run without a home); an empty name counts as none.
 TEST(StorageFile, TheDefaultFileFollowsTheEnvironment) {
-    const std::pair<const char*, const char*> cases[] = {
-        {"/s", "/s/xtokline/retained.sqlite3"},
-        {"", "/h/.local/state/xtokline/retained.sqlite3"},
-        {nullptr, "/h/.local/state/xtokline/retained.sqlite3"}};
+    const char* cases[][3] = {{"/s", "/h", "/s/xtokline/retained.sqlite3"},
+                              {"", "/h", "/h/.local/state/xtokline/retained.sqlite3"},
+                              {nullptr, "/h", "/h/.local/state/xtokline/retained.sqlite3"},
+                              {nullptr, "", ""},
+                              {nullptr, nullptr, ""}};
     auto set = [](const char* name, const char* value) {
         value ? setenv(name, value, 1) : unsetenv(name);
     };
     const char* was[] = {std::getenv("XDG_STATE_HOME"), std::getenv("HOME")};
     const std::string saved[] = {was[0] ? was[0] : "", was[1] ? was[1] : ""};
-    set("HOME", "/h");
-    for (const auto& [value, path] : cases) {
-        set("XDG_STATE_HOME", value);
-        EXPECT_EQ(defaultStoragePath(), path) << (value ? value : "unset");
+    for (const auto& [state, home, path] : cases) {
+        set("XDG_STATE_HOME", state);
+        set("HOME", home);
+        EXPECT_EQ(defaultStoragePath(), path)
+            << (state ? state : "unset") << (home ? home : "unset");
     }
     set("XDG_STATE_HOME", was[0] ? saved[0].c_str() : nullptr);
     set("HOME", was[1] ? saved[1].c_str() : nullptr);
