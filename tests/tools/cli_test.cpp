@@ -22,6 +22,7 @@ namespace xtok::tools::test {
 namespace {
 
 using namespace std::chrono_literals;
+using namespace std::string_literals;
 
 const std::string kHost = XTOK_HOST_PATH;
 const std::string kPlugin = XTOK_PLUGIN_PATH;
@@ -53,13 +54,14 @@ TEST(Cli, DemoShowsTokensWithinSecondsAndStopsAtTheCount) {
 }
 
 TEST(Cli, CtrlCEndsTheDemoCleanly) {
-    Subprocess demo({kHost, "demo", "--interval", "50", "--plugin", kPlugin});
+    Subprocess demo({kHost, "demo", "--interval", "50", "--monitor", "--plugin", kPlugin});
     // Without a count it goes on: a second code comes before Ctrl-C.
     ASSERT_TRUE(demo.waitForOutput("received  \"", 5s, 2));
     demo.interrupt();
     Finished done = demo.finish(10s);
     EXPECT_EQ(done.status, 0) << done.err;
     EXPECT_NE(done.out.find(" received, "), std::string::npos) << done.out;
+    EXPECT_NE(done.out.find("  tx     \"\\x02OK "), std::string::npos) << done.out;
 }
 
 class Session : public ::testing::Test {
@@ -344,8 +346,12 @@ TEST_F(Session, WatchTakesAQueueOf256Tokens) {
 TEST_F(Session, TheEditorsDefaultsFillTheLine) {
     Finished done = runTool({kHost, "run", line_->slavePath(), "--plugin", kPlugin, "--state",
                              dir_.file("retained.sqlite3"), "--exec", "settings"});
-    EXPECT_NE(done.out.find(line_->slavePath() + ",9600,even,8,1,RS-232\n"), std::string::npos)
-        << done.out;
+    for (const std::string& line :
+         {line_->slavePath() + ",9600,even,8,1,RS-232\n",
+          "SP_Par             parity            even        configuration"s,
+          "SP_Gap             gap               0           default"s}) {
+        EXPECT_NE(done.out.find(line), std::string::npos) << line << " in\n" << done.out;
+    }
 }
 
 /// A pseudo-terminal as a person's terminal: cooked, as a shell leaves it.
@@ -525,7 +531,9 @@ TEST(Cli, DescribeShowsTheNineteenMemoryTypesAndTheWholeXml) {
          {"  port              list of string    default com1    mandatory  16 choices: com1, "
           "com2, com3, com4 ... com16",
           "  parity            list of string    default even    mandatory  none, even, odd",
-          "  rx_prefix         string            -               optional"}) {
+          "  rx_prefix         string            -               optional",
+          "  tx_token           byte         write-only  Token To Send",
+          "  connect            boolean      read/write  Connect"}) {
         EXPECT_NE(std::find(lines.begin(), lines.end(), line), lines.end()) << line;
     }
 
@@ -533,6 +541,15 @@ TEST(Cli, DescribeShowsTheNineteenMemoryTypesAndTheWholeXml) {
     EXPECT_EQ(xml.status, 0) << xml.err;
     EXPECT_EQ(xml.out.rfind("<?xml", 0), 0u);
     EXPECT_EQ(countOf(xml.out, "<memtype "), 19);
+}
+
+TEST(Cli, RunOffersAnOptionPerKeyWithItsChoices) {
+    Finished done = runTool({kHost, "run", "--help"});
+    for (const char* line :
+         {"  --parity TEXT               Parity: none, even, odd (default even)\n",
+          "Token Queue Size, 1 to 10000 (default 100)\n"}) {
+        EXPECT_NE(done.out.find(line), std::string::npos) << line << " in\n" << done.out;
+    }
 }
 
 TEST(Cli, PortsListsWhatThereIsAndSaysWhatItCannot) {
@@ -647,6 +664,9 @@ const BadInput kBadInputs[] = {
      "unknown option '--baudrat'; did you mean '--baudrate'?", 2},
     {"blank in a value", "run|{line}|--prefix|02 gap=9", "cannot be written", 2},
     {"no configuration at all", "run|--config|hello", "unknown format", 2},
+    {"word without a value", "run|--config|{np} port={line} foo", "'foo' is no key=value", 2},
+    {"key that only starts like a node", "run|--config|{np} port={line} Nodes=1",
+     "unknown key 'Nodes'", 2},
     // Refused whatever is retained: the run does not start disconnected.
     {"configured baud rate the port lacks", "run|{line}|--parity|none|--baud|14400",
      "cannot start: {line}: baud rate 14400 is not supported", 1},
