@@ -429,6 +429,20 @@ TEST_F(Session, TheTerminalIsLeftAsItWasHoweverTheRunEnds) {
     }
 }
 
+// At the prompt the monitor's lines come as they happen, not when a line is
+// typed.
+TEST_F(Session, MonitorLinesReachThePromptUntyped) {
+    Terminal terminal;
+    Subprocess session(run({}), "", false, terminal.slave());
+    ASSERT_TRUE(session.waitForOutput("xtok> ", 10s));
+    ASSERT_TRUE(terminal.type("monitor on\n"));
+    ASSERT_TRUE(session.waitForOutput("monitor on", 5s));
+    device_->sendRaw("\2Z\3");
+    EXPECT_TRUE(session.waitForOutput("token  suffix  \"Z\"", 5s));
+    ASSERT_TRUE(terminal.type("quit\n"));
+    EXPECT_EQ(session.finish(10s).status, 0);
+}
+
 // The monitor beside the console: tokens with zero bytes and the rule that
 // ended each, the framing changed by a console setter on the way (a new pass
 // takes it: the port is closed and opened around it), and watch showing such
