@@ -31,12 +31,12 @@ const Scenario kMemoryTypes[] = {
      "cmd set_hexToken OFF; r rx_token; r rx_token_len; w token_ack 0; r rx_token; r rx_token_len",
      "OK | OK | A | 3 | 000AFF | 6"},
     {"RefusedAccesses",
-     "conf; r tokens_available; err; w tx_token A; err; go; w rx_token?string-8 x; "
+     "conf; r tokens_available; err; w tx_token A; err; go; w rx_token?string-8 x; err; "
      "w rx_token_len 1; w tokens_available 1; w SP_RxPrefix?string-10000 02; "
      "w SP_RxPrefix?string-9999 02",
      "!Protocol not started | -3 Protocol not started | !Protocol not started | -3 Protocol not "
-     "started | !writing to read_only type | !writing to read_only type | !writing to read_only "
-     "type | !writing after the end of memory type"},
+     "started | !writing to read_only type | -1 writing to read_only type | !writing to read_only "
+     "type | !writing to read_only type | !writing after the end of memory type"},
     // Refused codes set no error of their own: the one before stands.
     {"SettingsAreValidatedAndStagedWithoutApplying",
      "start; w SP_Baud 19200; r SP_Baud; w SP_Baud 115200; w SP_Baud 14400; w SP_Par 4; "

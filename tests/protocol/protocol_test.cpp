@@ -130,6 +130,7 @@ TEST_F(Protocol, TagsAreMadeOrRefusedWithTheirReason) {
         {"0?SP_Baud?unsignedInt", nullptr, 0},
     };
     ASSERT_TRUE(configure("Node3::model=7 Node4::model=1"));
+    EXPECT_EQ(protocol->GetTagProperty(nullptr), 0);
     for (const UriCase& c : cases) {
         ITag* made = protocol->CreateTag(c.uri);
         EXPECT_EQ(made != nullptr, c.reason == nullptr) << c.uri;
