@@ -167,15 +167,6 @@ std::string ParamParser::nodePrefix(int32_t node) {
     return "Node" + std::to_string(node) + "::";
 }
 
-const std::string* ParamParser::findNodeValue(const std::string& name, int32_t node) {
-    if (node != -1) {
-        if (const std::string* v = findValue(nodePrefix(node) + name)) {
-            return v;
-        }
-    }
-    return findValue(name);
-}
-
 int ParamParser::lookup(const std::string& name, int32_t node, std::string& out, int flags) {
     if ((flags & PARAM_NODE_INDEPENDENT) && (flags & PARAM_NODE_DEPENDENT)) {
         return PARAM_INVALID_SPEC;

@@ -43,9 +43,6 @@ public:
     /// value, valid until the next raw lookup, or null when there is none.
     const std::string* findValue(const std::string& name);
     static std::string nodePrefix(int32_t node);
-    /// Without rules: the node's entry when node is not -1, else (or when
-    /// that is missing) the unprefixed one.
-    const std::string* findNodeValue(const std::string& name, int32_t node);
     /// Rule-checking lookup; writes `out` only on PARAM_OK.
     int lookup(const std::string& name, int32_t node, std::string& out, int flags);
 

@@ -116,6 +116,7 @@ TEST(TagBase, ConvertsInListOrderAndPlacesItsDatumInItsMemoryType) {
     std::string raw(2, '?'), value(2, '?');
     ASSERT_TRUE(tag.Convert("\x01\0", &raw[0], 1) && tag.Convert(raw.data(), &value[0], 0));
     EXPECT_EQ(raw + value, "\0\xff\x01\0"s);  // 00 01, then -0x0100; back again
+    EXPECT_FALSE(tag.Convert(nullptr, &raw[0], 1) || tag.Convert("\1\0", nullptr, 1));
 
     TagBase bad = tagOf("short-3(swap2,swap4)");
     std::string untouched(6, '?');
