@@ -349,6 +349,7 @@ TEST_F(Session, TheEditorsDefaultsFillTheLine) {
     for (const std::string& line :
          {line_->slavePath() + ",9600,even,8,1,RS-232\n",
           "SP_Par             parity            even        configuration"s,
+          "SP_Mode            mode              RS-232      configuration"s,
           "SP_Gap             gap               0           default"s}) {
         EXPECT_NE(done.out.find(line), std::string::npos) << line << " in\n" << done.out;
     }
