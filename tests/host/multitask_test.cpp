@@ -2,6 +2,7 @@
 // the one StopTask whose time-out is the point of the test.
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <future>
 #include <thread>
 
@@ -60,6 +61,10 @@ TEST(Tasks, RunOnTheirOwnThreadUntilStopped) {
     EXPECT_EQ(tasks.liveTasks(), 0);
     // The handle is gone; a second stop must not touch it again.
     EXPECT_FALSE(tasks.StopTask(task, 0));
+    // A task that pauses must not spin instead.
+    const auto before = std::chrono::steady_clock::now();
+    tasks.Sleep(20);
+    EXPECT_GE(std::chrono::steady_clock::now() - before, std::chrono::milliseconds(20));
 }
 
 TEST(Tasks, StopTimesOutWhileTheBodyRunsAndSucceedsLater) {
