@@ -194,7 +194,9 @@ std::vector<std::string> checkConfiguration(const ConfigText& config,
     checker.missing(config);
     checker.line(config);
     if (checker.untold > 0) {
-        checker.errors.push_back("and " + std::to_string(checker.untold) + " faults more");
+        const std::size_t more = checker.untold;
+        checker.errors.push_back("and " + std::to_string(more) +
+                                 (more == 1 ? " fault" : " faults") + " more");
     }
     return checker.errors;
 }
