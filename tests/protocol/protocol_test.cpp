@@ -195,6 +195,7 @@ TEST_F(Protocol, IdentityAndQueryRecord) {
     EXPECT_EQ(record[4], 0);
     EXPECT_EQ(protocol->QueryRecord(3, record), 0x5A);
     EXPECT_EQ(protocol->QueryRecord(1, record) + protocol->QueryRecord(4, record), 0);
+    EXPECT_EQ(protocol->QueryRecord(0, nullptr) + protocol->QueryRecord(3, nullptr), 0);
 }
 
 }  // namespace
