@@ -135,6 +135,7 @@ bool Protocol_XTOK::setConnected(bool on) {
         // Cleared before waiting for portLock: the receive task ends its
         // pass at the next byte instead of reading on.
         if (connected_.exchange(false)) {
+            closes_.fetch_add(1, std::memory_order_relaxed);
             HostLock port(portLock_);
             port_.Close();
         }

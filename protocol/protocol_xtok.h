@@ -139,6 +139,11 @@ private:
     IMutex* queueLock_ = nullptr;
     IMutex* portLock_ = nullptr;
     std::atomic<bool> connected_{false};
+    /// Port closes so far. A pass that began before a close ends at its next
+    /// byte, even when the port has been opened again meanwhile: a frame
+    /// never joins bytes from both sides of a disconnect.
+    std::atomic<uint32_t> closes_{0};
+    uint32_t passCloses_ = 0;  ///< closes_ when the receive task's pass began
 };
 
 }  // namespace xtok

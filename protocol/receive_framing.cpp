@@ -41,13 +41,15 @@ void Protocol_XTOK::pushToken(const char* bytes, std::size_t length) {
 Protocol_XTOK::ReadResult Protocol_XTOK::readByte(uint8_t* byte, int32_t timeoutMs) {
     HostLock hold(portLock_);
     // Checked under the lock: a close by "connect" waits for this read.
-    if (!connected_.load(std::memory_order_acquire)) {
+    if (!connected_.load(std::memory_order_acquire) ||
+        closes_.load(std::memory_order_relaxed) != passCloses_) {
         return ReadResult::Disconnected;
     }
     return port_.ReadByte(byte, timeoutMs) ? ReadResult::Byte : ReadResult::Timeout;
 }
 
 void Protocol_XTOK::receiveToken() {
+    passCloses_ = closes_.load(std::memory_order_relaxed);
     if (!connected_.load(std::memory_order_acquire)) {
         if (IMultiTask2* tasks = services_.multiTask) {
             tasks->Sleep(kIdleSleepMs);

@@ -184,5 +184,24 @@ TEST_F(Receive, ACloseDuringAReadWaitsForItAndDropsTheFrame) {
     EXPECT_EQ(run("cmd connect ON; play 44; tokens"), "OK | D");
 }
 
+// A frame never joins bytes from both sides of a disconnect, even when the
+// port is open again before the receive task reads on. The queue lock, held
+// here, stops the task between two reads of one pass: at its token "A".
+TEST_F(Receive, AFrameDoesNotSpanACloseAndAReopen) {
+    ASSERT_TRUE(start("rx_prefix=02"));
+    host.serial().hold(
+        "\x02"
+        "A");
+    ASSERT_TRUE(host.serial().waitHeld());
+    FakeMutex& queue = *host.tasks().mutex(0);
+    queue.Lock();
+    host.serial().release(0x02);
+    std::string replies = command("connect OFF");
+    replies += command("connect ON");
+    queue.Unlock();
+    EXPECT_EQ(replies, "OKOK");
+    EXPECT_EQ(run("play 42 02 43 02; tokens"), "A,C");
+}
+
 }  // namespace
 }  // namespace xtok::test
