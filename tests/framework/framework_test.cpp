@@ -156,7 +156,9 @@ TEST(Clock, StampsAndBrokenDownTimesBothWays) {
     EXPECT_EQ(brokenDown(-kFileTimeEpochOffsetMs) + brokenDown(253402300799999),
               "1601-01-01 1 00:00:00.000 9999-12-31 5 23:59:59.999 ");
     EXPECT_EQ(brokenDown(-kFileTimeEpochOffsetMs - 1) + brokenDown(INT64_MAX), "refused refused ");
-    int64_t stamp = -1;  // each field out of range
+    int64_t stamp = -1;
+    EXPECT_TRUE(SystemTimeToStamp({30827, 12, 0, 31, 23, 59, 59, 999}, stamp));  // the last one
+    // Each field out of range.
     EXPECT_FALSE(
         SystemTimeToStamp({2001, 2, 0, 29}, stamp) || SystemTimeToStamp({2000, 13, 0, 1}, stamp) ||
         SystemTimeToStamp({2000, 12, 0, 32}, stamp) ||

@@ -30,7 +30,8 @@ TEST(ParamParser, CutsTheFirstVersionOneSectionAndListsItsNodes) {
     // Distinct nodes in order; "Node::" is node 0; names that are no number are skipped.
     EXPECT_EQ(scan("CfgVer=1Node2::Node7::Node2::NodeA::Node::"),
               "[Node2::Node7::Node2::NodeA::Node::]2 7 0 ");
-    EXPECT_EQ(scan("CfgVer=1Node3:x Node99999999999::"), "[Node3:x Node99999999999::]2147483647 ");
+    EXPECT_EQ(scan("CfgVer=1Node3:x Node99999999999:: Node2147483648::"),
+              "[Node3:x Node99999999999:: Node2147483648::]2147483647 ");
 }
 
 // "<result code> <output>," of the rule-checking lookup; "-" when left alone.

@@ -118,9 +118,10 @@ TEST_F(Console, WithoutAReplyBufferCommandsStillRun) {
 // Unknown everywhere: result 0 and the reply untouched.
 TEST_F(Console, UnknownLinesAnswerFalseAndLeaveTheReply) {
     ASSERT_TRUE(start());
-    EXPECT_EQ(command("info").rfind(
-                  "Protocol: XTOK (471) v.106\nImplementation: Protocol_XTOK v.100\n", 0),
-              0u);
+    EXPECT_EQ(command("info"),
+              "Protocol: XTOK (471) v.106\nImplementation: Protocol_XTOK v.100\nProtocolBase "
+              "v.100\nProtLib v.200\nIMultiTask2 v.200\nISerialFactory v.300\nISocketFactory "
+              "v.100\n");
     bool result = true;
     for (const char* line : {"Help", "Connect ON", "", " get_stat", "get_stat2"}) {
         EXPECT_EQ(cut(line, 4, &result), "############") << "'" << line << "'";
