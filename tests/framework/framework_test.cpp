@@ -65,7 +65,9 @@ TEST(DataTypes, ParseTheTypeOfATagAddressThenConvertInPlaceOrRefuse) {
         EXPECT_EQ(IsBitType(code), code == kBoolean || code == kBooleanArray) << name;
     }
     EXPECT_EQ(DataTypeName(15, 8) + DataTypeName(28, 4), "short-4??");
-    EXPECT_EQ(DataTypeBit(0) + DataTypeBit(28) + ElementSize(28) + ElementCount(kShort, 8), 4u);
+    EXPECT_EQ(DataTypeBit(0) + DataTypeBit(28) + ElementSize(28) + ElementCount(kShort, 8) +
+                  ElementCount(28, 8),
+              5u);
     EXPECT_EQ(conv("unsignedByte-2", "swapnibble", 1, "\x12\xf0") +
                   conv("short-2", "swap2", 0, "1234") + conv("int-2", "swap4", 1, "12345678"),
               "\x21\x0f|2143|43218765|");

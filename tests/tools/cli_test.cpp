@@ -348,6 +348,7 @@ TEST_F(Session, TheEditorsDefaultsFillTheLine) {
                              dir_.file("retained.sqlite3"), "--exec", "settings"});
     for (const std::string& line :
          {line_->slavePath() + ",9600,even,8,1,RS-232\n",
+          "setting            key               active      from           staged      retained\n"s,
           "SP_Par             parity            even        configuration"s,
           "SP_Mode            mode              RS-232      configuration"s,
           "SP_Gap             gap               0           default"s}) {
@@ -699,6 +700,7 @@ const BadInput kBadInputs[] = {
     {"unknown command", "bogus", "unknown command 'bogus'", 2},
     {"unknown option", "demo|--colour", "--colour", 2},
     {"count of zero", "demo|--count|0", "whole number above 0", 2},
+    {"interval below 20 ms", "demo|--count|19|--interval|19", "--interval", 2},
     {"watch count of zero", "run|--config|{np} port={line}|--exec|watch --count 0", "--count", 1},
     {"bad port map", "run|{line}|--map|com99=/dev/x", "comN=DEVICE", 2},
     {"configuration file missing", "run|--config|@{dir}/none.cfg", "cannot read", 2},
@@ -706,8 +708,9 @@ const BadInput kBadInputs[] = {
      "run|--config|{np} port={line}|--exec|tag write 0?SP_TokenQueueSize?unsignedInt 0",
      "warning: SP_TokenQueueSize 0 lies outside the project editor's range 1 to 10000", 0},
     {"queue size above the editor's range",
-     "run|--config|{np} port={line}|--exec|tag write 0?SP_TokenQueueSize?unsignedInt 10001",
-     "SP_TokenQueueSize 10001 lies outside", 0},
+     "run|--config|{np} port={line}|--exec|tag write 0?SP_TokenQueueSize?unsignedInt 10001; "
+     "tag write 0?SP_Gap?unsignedInt 5",
+     "SP_TokenQueueSize 10001 lies outside", 0},  // told once, not at every write
     {"configuration file too large", "run|--config|@{dir}/big.cfg", "at most 1 MiB", 2},
     {"configuration file of 1 MiB, no more", "run|--config|@{dir}/mib.cfg", "unknown format", 2},
     {"configuration file with a zero byte", "run|--config|@{dir}/zero.cfg", "zero byte", 2},
