@@ -1,5 +1,5 @@
 // Tasks and locks on real threads. Nothing here waits for time to pass except
-// the one StopTask whose time-out is the point of the test.
+// the one StopTask whose time-out is the point of the test, and one Sleep.
 #include <gtest/gtest.h>
 
 #include <chrono>
