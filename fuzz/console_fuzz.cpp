@@ -2,8 +2,6 @@
 // size, "@null" passes none; ">hex|hex" plays bytes on the line): no reply
 // runs past its buffer, and a line no console knows answers false and leaves
 // the buffer untouched.
-#include <set>
-
 #include "fuzz/fuzz_session.h"
 #include "xtokline/text.h"
 
@@ -12,27 +10,11 @@ using namespace xtok::fuzz;
 
 namespace {
 
-const std::set<std::string> kCommands = {"help",
-                                         "connect",
-                                         "get_stat",
-                                         "put",
-                                         "get",
-                                         "tokens_available",
-                                         "get_token_length",
-                                         "token_ack",
-                                         "set_hexToken",
-                                         "set_rxGap",
-                                         "set_rxPrefix",
-                                         "set_rxSuffix",
-                                         "set_txPrefix",
-                                         "set_txSuffix",
-                                         "info",
-                                         "xml",
-                                         "lasterror",
-                                         "read",
-                                         "write",
-                                         "getmaxtm",
-                                         "deletetags"};
+// Every command a console knows, each between blanks.
+const std::string kCommands =
+    " help connect get_stat put get tokens_available get_token_length token_ack set_hexToken "
+    "set_rxGap set_rxPrefix set_rxSuffix set_txPrefix set_txSuffix info xml lasterror read write "
+    "getmaxtm deletetags ";
 
 }  // namespace
 
@@ -61,7 +43,8 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         FUZZ_CHECK(reply.guardIntact());
         std::vector<std::string> words;
         splitTrimmed(line, ' ', words);
-        FUZZ_CHECK(kCommands.count(words[0]) || (!result && reply.untouched()));
+        const bool known = kCommands.find(' ' + words[0] + ' ') != std::string::npos;
+        FUZZ_CHECK(known || (!result && reply.untouched()));
     }
     FUZZ_CHECK(session.readInt("tokens_available") >= 0);
     return 0;

@@ -16,7 +16,6 @@
 #include "host/serial_line.h"
 #include "tests/host/notice_log.h"
 #include "tests/host/temp_dir.h"
-#include "tests/host/terminal_settings.h"
 
 namespace xtok::host {
 namespace {
@@ -163,26 +162,6 @@ TEST_F(Pty, RefusesSettingsItCannotApplyAndSaysWhy) {
     EXPECT_EQ(notices_.count(slave_), 7);
     termios unchanged = lineSettings();
     EXPECT_EQ(cfgetospeed(&unchanged), B19200);
-}
-
-// A terminal used as a port is a terminal again once the port is closed,
-// whatever the port was set to meanwhile.
-TEST_F(Pty, AClosedPortLeavesTheDeviceAsItFoundIt) {
-    factory_.Close(port_);
-    int fd = open(slave_.c_str(), O_RDWR | O_NOCTTY | O_CLOEXEC);
-    termios cooked{};
-    ASSERT_EQ(tcgetattr(fd, &cooked), 0);
-    cooked.c_lflag |= ICANON | ECHO | ISIG;
-    cooked.c_iflag |= ICRNL | IXON;
-    cfsetspeed(&cooked, B2400);
-    ASSERT_EQ(tcsetattr(fd, TCSANOW, &cooked), 0);
-    ASSERT_EQ(tcgetattr(fd, &cooked), 0);
-    close(fd);
-    port_ = factory_.Open(slave_.c_str());
-    ASSERT_TRUE(port_ && port_->Configure(19200, 1, 7, 2, 0));
-    factory_.Close(port_);
-    EXPECT_EQ(test::settingsText(lineSettings()), test::settingsText(cooked));
-    port_ = factory_.Open(slave_.c_str());  // for TearDown
 }
 
 TEST(SerialFactory, TellsWhyAPortDoesNotOpen) {

@@ -34,24 +34,6 @@ int tokenNumber(const std::string& token) {
 
 class Locks : public ProtocolFixture {};
 
-// A read or write of a token type holds the queue lock (made first) once,
-// for its whole duration, whatever the tag's size.
-TEST_F(Locks, ATokenTypeAccessTakesTheQueueLockOnce) {
-    ASSERT_TRUE(start("autoConnect=false"));
-    FakeMutex& queue = *host.tasks().mutex(0);
-    for (const char* what :
-         {"tokens_available?unsignedInt", "rx_token_len?unsignedInt", "rx_token?string-64"}) {
-        tag("0?" + std::string(what));
-        const long before = queue.locks;
-        read(what);
-        EXPECT_EQ(queue.locks - before, 1) << what;
-    }
-    tag("0?token_ack?boolean");
-    const long before = queue.locks;
-    write("token_ack?boolean", "1");
-    EXPECT_EQ(queue.locks - before, 1);
-}
-
 TEST_F(Locks, EverythingAtOnce) {
     ASSERT_TRUE(start("rx_prefix=02 rx_suffix=03 token_queue_size=4"));
     for (const char* uri :

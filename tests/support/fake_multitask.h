@@ -41,14 +41,9 @@ private:
 class FakeMutex final : public IMutex {
 public:
     void* Destroy(unsigned) override { return this; }
-    void Lock() override {
-        mutex_.lock();
-        ++locks;
-    }
+    void Lock() override { mutex_.lock(); }
     bool TryLock() override { return mutex_.try_lock(); }
     void Unlock() override { mutex_.unlock(); }
-
-    std::atomic<long> locks{0};  ///< Lock calls so far
 
 private:
     std::recursive_mutex mutex_;

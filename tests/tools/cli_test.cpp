@@ -110,15 +110,6 @@ const Script kScripts[] = {
       "Commands of xtok-host", "connect cmd - set connect ON or OFF\n"},
      {},
      0},
-    // However long the gap, a close and the end come within about half a
-    // second (the run's deadline would end a wait of ten minutes): the wait
-    // for silence is read in slices.
-    {"ALongGapDelaysNoClose",
-     {},
-     "tag write 0?SP_Gap?unsignedInt 600000; tag write 0?SP_Done?boolean 1; connect OFF; get_stat",
-     {"ok\nok\nOK\nDisconnected\n"},
-     {},
-     0},
     {"RetainedSettingsSurviveARestart",
      {},
      "tag write 0?SP_Baud?unsignedInt 19200; tag write 0?SP_RxSuffix?string-8 0D0A; "
