@@ -94,9 +94,10 @@ TEST_F(Protocol, ConfigurationErrorsSayWhy) {
         EXPECT_EQ(error(), message) << text;
     }
     EXPECT_EQ(run("line").substr(0, 10), "com7,4800,");  // what was read before stays
+    // A common key under a node's prefix is no entry for it, and no fault.
     EXPECT_TRUE(
         configure("token_queue_size=10000 rx_prefix=0d0A tx_prefix=none gap=0x14 "
-                  "Node3::model=7"));
+                  "Node3::model=7 Node0::rx_suffix=zz"));
     EXPECT_TRUE(configure("token_queue_size=1"));  // a second Configure starts afresh
     EXPECT_NE(protocol->CreateTag("3?connect?boolean"), nullptr) << error();
 }
