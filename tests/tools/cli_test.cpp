@@ -423,17 +423,28 @@ TEST_F(Session, TheTerminalIsLeftAsItWasHoweverTheRunEnds) {
 }
 
 // At the prompt the monitor's lines come as they happen, not when a line is
-// typed.
-TEST_F(Session, MonitorLinesReachThePromptUntyped) {
+// typed. A reset-retained after the device went away starts the plug-in anew,
+// disconnected, and the session goes on.
+TEST_F(Session, ThePromptShowsMonitorLinesUntypedAndOutlivesALostDevice) {
+    const std::string link = dir_.file("ttyLINK");
+    ASSERT_EQ(symlink(line_->slavePath().c_str(), link.c_str()), 0);
+    std::vector<std::string> arguments = run({});
+    arguments[3] = configFor(link);
     Terminal terminal;
-    Subprocess session(run({}), "", false, terminal.slave());
+    Subprocess session(arguments, "", false, terminal.slave());
     ASSERT_TRUE(session.waitForOutput("xtok> ", 10s));
     ASSERT_TRUE(terminal.type("monitor on\n"));
     ASSERT_TRUE(session.waitForOutput("monitor on", 5s));
     device_->sendRaw("\2Z\3");
     EXPECT_TRUE(session.waitForOutput("token  suffix  \"Z\"", 5s));
+    ASSERT_EQ(unlink(link.c_str()), 0);
+    ASSERT_TRUE(terminal.type("reset-retained\nget_stat\n"));
+    EXPECT_TRUE(session.waitForOutput("Disconnected", 5s));
     ASSERT_TRUE(terminal.type("quit\n"));
-    EXPECT_EQ(session.finish(10s).status, 0);
+    Finished done = session.finish(10s);
+    EXPECT_EQ(done.status, 0) << done.err;
+    EXPECT_NE(done.out.find("; the plug-in started anew, disconnected ("), std::string::npos)
+        << done.out;
 }
 
 // The monitor beside the console: tokens with zero bytes and the rule that
