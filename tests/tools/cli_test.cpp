@@ -423,7 +423,8 @@ TEST_F(Session, TheTerminalIsLeftAsItWasHoweverTheRunEnds) {
 }
 
 // At the prompt the monitor's lines come as they happen, not when a line is
-// typed. A reset-retained after the device went away starts the plug-in anew,
+// typed; SP_Done empties xtok-host's copy of the queue with the plug-in's. A
+// reset-retained after the device went away starts the plug-in anew,
 // disconnected, and the session goes on.
 TEST_F(Session, ThePromptShowsMonitorLinesUntypedAndOutlivesALostDevice) {
     const std::string link = dir_.file("ttyLINK");
@@ -437,6 +438,13 @@ TEST_F(Session, ThePromptShowsMonitorLinesUntypedAndOutlivesALostDevice) {
     ASSERT_TRUE(session.waitForOutput("monitor on", 5s));
     device_->sendRaw("\2Z\3");
     EXPECT_TRUE(session.waitForOutput("token  suffix  \"Z\"", 5s));
+    // SP_Done empties the queue: the next token is watched whole, not as "Z".
+    ASSERT_TRUE(terminal.type("tag write 0?SP_Done?boolean 1\n"));
+    ASSERT_TRUE(session.waitForOutput("ok\n", 5s));
+    device_->sendRaw(std::string("\2B\0C\3", 5));
+    ASSERT_TRUE(terminal.type("watch --count 1 --timeout 5\n"));
+    // Shown whole twice: by the monitor and by watch.
+    EXPECT_TRUE(session.waitForOutput("\"B\\x00C\"  42 00 43  (3 bytes)\n", 5s, 2));
     ASSERT_EQ(unlink(link.c_str()), 0);
     ASSERT_TRUE(terminal.type("reset-retained\nget_stat\n"));
     EXPECT_TRUE(session.waitForOutput("Disconnected", 5s));
