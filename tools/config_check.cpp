@@ -194,9 +194,8 @@ std::vector<std::string> checkConfiguration(const ConfigText& config,
     checker.missing(config);
     checker.line(config);
     if (checker.untold > 0) {
-        const std::size_t more = checker.untold;
-        checker.errors.push_back("and " + std::to_string(more) +
-                                 (more == 1 ? " fault" : " faults") + " more");
+        checker.errors.push_back("and " + std::to_string(checker.untold) +
+                                 (checker.untold == 1 ? " fault" : " faults") + " more");
     }
     return checker.errors;
 }
