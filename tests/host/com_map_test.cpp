@@ -27,20 +27,5 @@ TEST(ComMap, ResolvesPortNames) {
     }
 }
 
-TEST(ComMap, RefusesMalformedAssignmentsAndKeepsTheLastGoodOne) {
-    ComMap ports;
-    std::string error;
-    for (const char* bad : {"com2", "com2=", "=/dev/b", "com17=/dev/b", "ttyS1=/dev/b"}) {
-        EXPECT_FALSE(ports.assign(bad, error)) << bad;
-        EXPECT_NE(error.find(bad), std::string::npos) << error;
-    }
-    ASSERT_TRUE(ports.assign("com2=/dev/a", error));
-    ASSERT_TRUE(ports.assign("COM2=/dev/c", error));
-    EXPECT_FALSE(ports.assign("com2=", error));
-    std::string device;
-    ASSERT_TRUE(ports.resolve("com2", device, error));
-    EXPECT_EQ(device, "/dev/c");
-}
-
 }  // namespace
 }  // namespace xtok::host

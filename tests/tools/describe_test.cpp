@@ -83,22 +83,6 @@ TEST(Describe, ADescriptionInflatesTo16MiBAtMost) {
     }
 }
 
-TEST(Describe, ACommentIsSkippedWholeAndEntitiesAreRead) {
-    DescriptionBlock found;
-    std::ostringstream out;
-    std::string error;
-    EXPECT_TRUE(summarizeDescription(
-        found,
-        "<protocol_cfg><!-- a > <memtypes><memtype>hidden</memtype></memtypes> -->"
-        "<memtypes><memtype display=\"&lt;A&gt; &amp;B\">shown</memtype></memtypes>"
-        "</protocol_cfg>",
-        out, error))
-        << error;
-    EXPECT_EQ(out.str().find("hidden"), std::string::npos) << out.str();
-    EXPECT_NE(out.str().find("shown"), std::string::npos) << out.str();
-    EXPECT_NE(out.str().find("<A> &B\n"), std::string::npos) << out.str();
-}
-
 TEST(Describe, MisshapenXmlIsRefusedNotReadPast) {
     DescriptionBlock found;
     std::ostringstream out;

@@ -6,7 +6,6 @@
 
 #include "tools/byte_text.h"
 #include "tools/monitor_lines.h"
-#include "tools/queue_mirror.h"
 #include "tools/token_view.h"
 
 namespace xtok::tools {
@@ -149,21 +148,6 @@ TEST(MonitorLines, TimesAndDroppedLines) {
     EXPECT_NE(linesDroppedLine(3, false).find(" 3 lines dropped: the console fell behind"),
               std::string::npos);
     EXPECT_NE(linesDroppedLine(3, true).find("\"linesDropped\":3}"), std::string::npos);
-}
-
-// After a clear the host's copies start afresh: the next token is the oldest.
-TEST(QueueMirror, ACopyOfEachTokenUntilTakenOrCleared) {
-    QueueMirror queue;
-    const auto at = std::chrono::system_clock::time_point(std::chrono::seconds(5));
-    long dropped = 0;
-    std::string oldest;
-    auto when = at;
-    EXPECT_FALSE(queue.framed("A", at, 2, dropped) || queue.framed("B", at, 2, dropped));
-    EXPECT_TRUE(queue.framed("C", at, 2, dropped) && dropped == 1);
-    queue.cleared();
-    queue.framed("D", at + std::chrono::seconds(1), 2, dropped);
-    EXPECT_TRUE(queue.oldest(oldest, when));
-    EXPECT_EQ(oldest + std::to_string((when - at).count() > 0), "D1");
 }
 
 }  // namespace
