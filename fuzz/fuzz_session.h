@@ -5,7 +5,6 @@
 // readers of the input's lines.
 #pragma once
 
-#include <cctype>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
@@ -19,6 +18,8 @@
 #include "tests/support/fake_host.h"
 
 namespace xtok::fuzz {
+
+using test::hexBytes;
 
 /// Ends the run like a sanitizer finding, so that libFuzzer keeps the input.
 #define FUZZ_CHECK(condition)                                                            \
@@ -115,18 +116,6 @@ inline std::vector<std::string> lines(const uint8_t* data, std::size_t size) {
     }
     for (std::string& line : out) {
         line.resize(std::strlen(line.c_str()));
-    }
-    return out;
-}
-
-/// Bytes from hex pairs, anything else skipped.
-inline std::string hexBytes(const std::string& text) {
-    std::string out, digits;
-    for (char c : text) {
-        digits += std::isxdigit(static_cast<unsigned char>(c)) ? std::string(1, c) : "";
-    }
-    for (std::size_t i = 0; i + 1 < digits.size(); i += 2) {
-        out.push_back(static_cast<char>(std::stoi(digits.substr(i, 2), nullptr, 16)));
     }
     return out;
 }

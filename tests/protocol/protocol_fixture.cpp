@@ -7,14 +7,6 @@
 
 namespace xtok::test {
 
-std::string hexBytes(const std::string& hex) {
-    std::string digits;
-    for (char c : hex) {
-        digits += c == ' ' ? "" : std::string(1, c);
-    }
-    return hexTextToBytes(digits);
-}
-
 bool eventually(const std::function<bool()>& condition) {
     const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(5);
     while (!condition()) {

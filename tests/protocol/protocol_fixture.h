@@ -23,8 +23,6 @@ namespace xtok::test {
 inline const std::string kBaseConfig =
     "CfgVer=1 model=1 port=com1 baudrate=9600 parity=even bits=8 stopbits=1 mode=RS-232";
 
-/// Bytes from hex pairs, blanks between them optional: "02 41" or "0241".
-std::string hexBytes(const std::string& hex);
 /// Polls `condition` until it holds or five seconds passed; true when it held.
 bool eventually(const std::function<bool()>& condition);
 

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <atomic>
+#include <cctype>
 #include <condition_variable>
 #include <cstdint>
 #include <deque>
@@ -14,10 +15,20 @@
 
 #include "tests/support/fake_service.h"
 #include "xtokline/constants.h"
+#include "xtokline/text.h"
 
 namespace xtok::test {
 
 using xtok::LineSettings;
+
+/// Bytes from hex pairs, anything but hex digits skipped: "02 41" or "0241".
+inline std::string hexBytes(const std::string& text) {
+    std::string digits;
+    for (char c : text) {
+        digits += std::isxdigit(static_cast<unsigned char>(c)) ? std::string(1, c) : "";
+    }
+    return hexTextToBytes(digits);
+}
 
 /// What happened on the line so far.
 struct LineRecord {

@@ -424,36 +424,6 @@ TEST_F(Session, ThePromptShowsMonitorLinesUntypedAndOutlivesALostDevice) {
         << done.out;
 }
 
-// The monitor beside the console: tokens with zero bytes and the rule that
-// ended each, the framing changed by a console setter on the way (a new pass
-// takes it: the port is closed and opened around it), and watch showing such
-// a token whole.
-TEST_F(Session, MonitorShowsEachTokenWithWhatEndedIt) {
-    Subprocess session(run({"--json", "--exec",
-                            "monitor on; watch --count 1 --timeout 10; connect OFF; "
-                            "set_rxSuffix none; connect ON; watch --count 2 --timeout 10"}));
-    ASSERT_TRUE(session.waitForOutput("\"monitor\":true", 5s));
-    device_->sendRaw(std::string("\2A\0B\3", 5));
-    ASSERT_TRUE(session.waitForOutput("\"reply\":\"OK\"", 5s, 3));
-    device_->sendRaw(std::string("\2C\0\2D", 5));
-    Finished done = session.finish(10s);
-    EXPECT_EQ(done.status, 0) << done.err;
-    for (const char* shown :
-         {"{\"event\":\"rx\",\"time\":\"", "\"end\":\"suffix\",\"hex\":\"410042\"",
-          "\"end\":\"next prefix\",\"hex\":\"4300\"", "\"end\":\"gap\",\"hex\":\"44\"",
-          "\"token\":\"A\\u0000B\",\"length\":3,\"hex\":\"410042\"}",
-          "\"token\":\"C\\u0000\",\"length\":2,\"hex\":\"4300\"}"}) {
-        EXPECT_NE(done.out.find(shown), std::string::npos) << shown << "\n" << done.out;
-    }
-    // watch stamps a token with the time it arrived, as the monitor does.
-    auto timeOf = [&done](const std::string& part) {
-        const std::size_t line = done.out.rfind('\n', done.out.find(part)) + 1;
-        const std::size_t at = done.out.find("\"time\":\"", line) + 8;
-        return done.out.substr(at, done.out.find('"', at) - at);
-    };
-    EXPECT_EQ(timeOf("\"token\":\"A\\u0000B\""), timeOf("\"end\":\"suffix\",\"hex\":\"410042\""));
-}
-
 TEST_F(Session, MonitorEndsAtItsCountAndLogsWhatItShows) {
     std::vector<std::string> arguments =
         run({"--json", "--count", "2", "--log", dir_.file("line.log")});
