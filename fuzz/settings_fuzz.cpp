@@ -4,26 +4,24 @@
 // succeeds and empties the queue, and what it retained a new protocol reads
 // back the same after a restart.
 #include "fuzz/fuzz_session.h"
+#include "protocol/settings.h"
 
 using namespace xtok;
 using namespace xtok::fuzz;
 
 namespace {
 
-const char* const kSettings[] = {
-    "SP_Baud?unsignedInt",    "SP_Bits?unsignedByte", "SP_Stop?unsignedByte",
-    "SP_Par?unsignedByte",    "SP_Mode?unsignedByte", "SP_RxPrefix?string-300",
-    "SP_RxSuffix?string-300", "SP_Gap?unsignedInt",   "SP_TxPrefix?string-300",
-    "SP_TxSuffix?string-300", "SP_HexTokens?boolean", "SP_TokenQueueSize?unsignedInt"};
 const std::string kConfig = "rx_prefix=02 rx_suffix=03 token_queue_size=5";
 
 /// Every setting's value; "?" where it cannot be read or is too long to retain.
 std::vector<std::string> readSettings(Session& session) {
+    // By SettingKind: Number, Byte, Flag, Hex.
+    const char* const types[] = {"unsignedInt", "unsignedByte", "boolean", "string-300"};
     std::vector<std::string> values;
-    for (const char* setting : kSettings) {
-        const std::string uri = std::string("0?") + setting;
-        std::string value = session.read(uri);
-        value = uri.back() == '0' ? value.c_str() : value;
+    for (const Setting& setting : kSettings) {
+        std::string value = session.read(std::string("0?") + setting.memoryType + "?" +
+                                         types[static_cast<int>(setting.kind)]);
+        value = setting.kind == SettingKind::Hex ? value.c_str() : value;
         values.push_back(value.size() > 255 ? "?" : value);
     }
     return values;

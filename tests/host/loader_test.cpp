@@ -11,7 +11,6 @@
 #include <iterator>
 
 #include "host/service_provider.h"
-#include "tests/host/notice_log.h"
 #include "tests/host/temp_dir.h"
 
 namespace xtok::host {
@@ -22,13 +21,12 @@ protected:
     void SetUp() override {
         HostOptions options;
         options.storagePath = dir_.file("retained.sqlite3");
-        options.notice = notices_.sink();
+        options.notice = [](const std::string&) {};
         provider_ = ServiceProvider::create(options, error_);
         ASSERT_NE(provider_, nullptr) << error_;
     }
 
     test::TempDir dir_;
-    test::NoticeLog notices_;
     std::unique_ptr<ServiceProvider> provider_;
     std::string error_;
 };

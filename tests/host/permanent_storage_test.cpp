@@ -5,7 +5,6 @@
 
 #include <climits>
 #include <string>
-#include <vector>
 
 #include "tests/host/temp_dir.h"
 
@@ -50,17 +49,6 @@ TEST_F(Storage, KeepsEachTypeAcrossReopening) {
     ASSERT_TRUE(extended && !extended->ReadTextTo("other", "prefix", text, 5));
     EXPECT_TRUE(extended->ReadTextTo("other", "prefix", text, 6) && text == std::string("ÄÖ\xff"));
     EXPECT_TRUE(storage->IsStored("XTOK", "empty") && !storage->IsStored("XTOK", "prefix"));
-    // A section is listed for people and cleared alone.
-    std::vector<StoredEntry> listed;
-    std::string error, shown;
-    ASSERT_TRUE(storage->list("XTOK", listed, error)) << error;
-    for (const StoredEntry& entry : listed) {
-        shown += entry.key + "=" + (entry.key == "long" ? "..." : entry.shown) + " ";
-    }
-    EXPECT_EQ(shown, "baud=9600 empty=\"\" long=... min=-2147483648 off=false on=true ");
-    ASSERT_TRUE(storage->clear("XTOK", error)) << error;
-    EXPECT_FALSE(storage->IsStored("XTOK", "baud"));
-    EXPECT_TRUE(storage->IsStored("other", "prefix"));
 }
 
 }  // namespace

@@ -7,10 +7,10 @@
 
 #include <ostream>
 #include <string>
+#include <vector>
 
 #include "host/serial_factory.h"
 #include "host/serial_line.h"
-#include "tests/host/notice_log.h"
 
 namespace xtok::host {
 namespace {
@@ -32,15 +32,15 @@ protected:
         master_ = posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
         ASSERT_TRUE(master_ >= 0 && grantpt(master_) == 0 && unlockpt(master_) == 0);
         port_ = factory_.Open(ptsname(master_));
-        ASSERT_NE(port_, nullptr) << notices_.lines().front();
+        ASSERT_NE(port_, nullptr) << notices_.front();
     }
     void TearDown() override {
         factory_.Close(port_);
         close(master_);
     }
 
-    test::NoticeLog notices_;
-    SerialFactory factory_{ComMap(), notices_.sink()};
+    std::vector<std::string> notices_;
+    SerialFactory factory_{ComMap(), [this](const std::string& text) { notices_.push_back(text); }};
     int master_ = -1;
     ISerialPort* port_ = nullptr;
 };
@@ -59,7 +59,7 @@ TEST_P(Lines, ReachTheDevice) {
     // A pseudo-terminal forces eight bits without parity enable; the rest stays.
     constexpr tcflag_t kKept = PARODD | CMSPAR | CSTOPB;
     EXPECT_EQ(applied.c_cflag & kKept, line.flags & kKept);
-    EXPECT_TRUE(notices_.lines().empty());
+    EXPECT_TRUE(notices_.empty());
 }
 
 INSTANTIATE_TEST_SUITE_P(

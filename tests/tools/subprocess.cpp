@@ -83,16 +83,7 @@ std::string Subprocess::file(const char* name) const {
 bool Subprocess::waitForOutput(const std::string& text, std::chrono::milliseconds patience,
                                int times) {
     const auto deadline = Clock::now() + patience;
-    auto seen = [&] {
-        const std::string out = contentOf(file("out"));
-        int count = 0;
-        for (std::size_t at = out.find(text); at != std::string::npos;
-             at = out.find(text, at + 1)) {
-            ++count;
-        }
-        return count >= times;
-    };
-    while (!seen()) {
+    while (countOf(contentOf(file("out")), text) < times) {
         if (Clock::now() > deadline) {
             return false;
         }
@@ -128,6 +119,14 @@ Finished Subprocess::finish(std::chrono::milliseconds patience) {
 Finished runTool(const std::vector<std::string>& arguments, const std::string& input,
                  bool asNobody) {
     return Subprocess(arguments, input, asNobody).finish(std::chrono::seconds(30));
+}
+
+int countOf(const std::string& text, const std::string& part) {
+    int count = 0;
+    for (std::size_t at = text.find(part); at != std::string::npos; at = text.find(part, at + 1)) {
+        ++count;
+    }
+    return count;
 }
 
 std::vector<std::string> linesOf(const std::string& text) {

@@ -51,6 +51,9 @@ private:
 Finished runTool(const std::vector<std::string>& arguments, const std::string& input = "",
                  bool asNobody = false);
 
+/// How often `part` occurs in `text`, overlaps counted.
+int countOf(const std::string& text, const std::string& part);
+
 /// Lines of `text`, without their line feeds.
 std::vector<std::string> linesOf(const std::string& text);
 

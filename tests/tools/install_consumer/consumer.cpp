@@ -12,17 +12,15 @@ static_assert(xtok::kProtocolSlotCount == 84, "the contract's protocol table");
 
 int main() {
     void* library = dlopen(XTOKLINE_PLUGIN, RTLD_NOW | RTLD_LOCAL);
-    if (!library) {
-        std::fprintf(stderr, "%s\n", dlerror());
-        return 1;
-    }
-    auto entry = reinterpret_cast<void* (*)()>(dlsym(library, "GetInterfaceFactory"));
+    auto entry =
+        reinterpret_cast<void* (*)()>(library ? dlsym(library, "GetInterfaceFactory") : nullptr);
     auto* root = entry ? static_cast<xtok::IInterfaceFactory*>(entry()) : nullptr;
     auto* factory =
         root ? static_cast<xtok::IProtocolFactory*>(root->GetInterface("IProtocolFactory"))
              : nullptr;
     if (!factory || !factory->GetName()) {
-        std::fprintf(stderr, "no protocol factory in %s\n", XTOKLINE_PLUGIN);
+        std::fprintf(stderr, "no protocol factory in %s (%s)\n", XTOKLINE_PLUGIN,
+                     library ? "loaded" : dlerror());
         return 1;
     }
     std::printf("%s\n", factory->GetName());
