@@ -32,7 +32,7 @@ protected:
         master_ = posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
         ASSERT_TRUE(master_ >= 0 && grantpt(master_) == 0 && unlockpt(master_) == 0);
         port_ = factory_.Open(ptsname(master_));
-        ASSERT_NE(port_, nullptr) << notices_.front();
+        ASSERT_NE(port_, nullptr) << (notices_.empty() ? "" : notices_.front());
     }
     void TearDown() override {
         factory_.Close(port_);

@@ -116,8 +116,8 @@ const Script kScripts[] = {
       "Commands of xtok-host", "connect cmd - set connect ON or OFF\n"},
      {},
      0},
-    // Every byte value but zero and the framing's crosses the line both ways
-    // unchanged: the terminal driver's conversions are off.
+    // Every byte value from 04 up crosses the line both ways unchanged: the
+    // terminal driver's conversions are off.
     {"EveryByteCrossesTheLine",
      {},
      "tag write 0?tx_token?string-300 " + highBytes(true) + "; watch --count 1 --timeout 10",
