@@ -72,12 +72,18 @@ public:
         std::memcpy(&value, bytes.data(), bytes.size() == 4 ? 4 : 0);
         return bytes.size() == 4 ? value : -1;
     }
+    /// `bytes` repeated over a tag's `size` ('A' when there are none), with no
+    /// terminator: a read past the value is caught.
+    static std::string filled(const std::string& bytes, int32_t size) {
+        std::string value(static_cast<std::size_t>(size), 'A');
+        for (std::size_t i = 0; i < value.size() && !bytes.empty(); ++i) {
+            value[i] = bytes[i % bytes.size()];
+        }
+        return value;
+    }
     bool write(const std::string& uri, const std::string& bytes) {
         ITag* tag = protocol->CreateTag(uri.c_str());
-        std::string value(static_cast<std::size_t>(tag ? tag->GetSize() : 0), 'A');
-        for (std::size_t i = 0; i < value.size() && !bytes.empty(); ++i) {
-            value[i] = bytes[i % bytes.size()];  // no terminator: a read past the value is caught
-        }
+        const std::string value = filled(bytes, tag ? tag->GetSize() : 0);
         std::unique_ptr<char[]> exact(new char[value.size()]);
         std::memcpy(exact.get(), value.data(), value.size());
         const bool ok = tag && protocol->WriteTag(tag, exact.get());

@@ -49,11 +49,7 @@ void useTag(Protocol_XTOK& protocol, ITag* tag, const std::string& uri) {
 /// A transmit of `hex` through `tag` sent its text, up to the first zero
 /// byte of the tag's value, between the STX/ETX framing.
 void checkTransmit(Session& session, ITag* tag, const std::string& hex, std::size_t writes) {
-    const std::string bytes = hexBytes(hex);
-    std::string value(static_cast<std::size_t>(tag->GetSize()), 'A');
-    for (std::size_t i = 0; i < value.size() && !bytes.empty(); ++i) {
-        value[i] = bytes[i % bytes.size()];
-    }
+    const std::string value = Session::filled(hexBytes(hex), tag->GetSize());
     FUZZ_CHECK(session.host.serial().writes().size() == writes + 1);
     FUZZ_CHECK(session.host.serial().writes().back() ==
                "\x02" + std::string(value.c_str()) + "\x03");
