@@ -7,7 +7,9 @@
 #include <iterator>
 #include <regex>
 
+#include "framework/data_types.h"
 #include "protocol/settings.h"
+#include "protocol/token_model.h"
 
 namespace xtok {
 namespace {
@@ -22,13 +24,12 @@ TEST(SettingsTable, EveryRowIsInTheDescriptionWithItsType) {
                                  "=\"([^\"]*)\"[^>]*>\\s*" + name + "\\b");
         return std::regex_search(xml, found, element) ? found[1].str() : "missing";
     };
-    // By SettingKind: Number, Byte, Flag, Hex.
-    const char* const natural[] = {"unsignedInt", "unsignedByte", "boolean", "byte"};
-    static_assert(sizeof natural / sizeof *natural == static_cast<int>(SettingKind::Hex) + 1);
+    for (const MemoryType& type : buildTokenModel().memoryTypes) {
+        EXPECT_EQ(attributeOf("memtype", type.name, "naturalType"),
+                  DataTypeName(type.naturalType, ElementSize(type.naturalType)))
+            << type.name;
+    }
     for (const Setting& setting : kSettings) {
-        EXPECT_EQ(attributeOf("memtype", setting.memoryType, "naturalType"),
-                  natural[static_cast<int>(setting.kind)])
-            << setting.memoryType;
         EXPECT_EQ(attributeOf("parameter", setting.configKey, "isMandatory"),
                   setting.mandatory ? "true" : "false")
             << setting.configKey;
